@@ -1,0 +1,39 @@
+// Service control of the core platform library. Services are controlled by
+// their scripts "/usr/tavo/etc/rc.sysv/<name>.sh" with the verbs start, stop,
+// reload and status. Thread-safe.
+#ifndef TAVO_TLIB_SERVICE_H_
+#define TAVO_TLIB_SERVICE_H_
+
+// Service states reported by TLIBServicectlStatus.
+enum {
+  TLIB_SERVICE_STOPPED = 0,
+  TLIB_SERVICE_RUNNING = 5,
+};
+
+// Runs the service's script with "reload" and waits for it. Returns the
+// script's exit status (0 success), -1 when the script is missing, could not
+// run or died by a signal.
+int TLIBServiceReload(const char* name);
+
+// Reports whether the service runs: its pid file "/run/<name>.pid" names a
+// living process. On success returns 0, stores that process id (or 0) in
+// `*pid` and TLIB_SERVICE_RUNNING or TLIB_SERVICE_STOPPED in `*state`.
+// Returns -1 with errno set (EINVAL for a null or empty name) and leaves the
+// outputs unchanged otherwise.
+int TLIBServicectlStatus(const char* name, int* pid, int* state);
+
+// A change of firewall service files, or a plain firewall reload.
+struct TLIB_SERVCONF_NOTIFY {
+  const char* old_file;   // the previous service file, or null
+  const char* new_file;   // the installed service file, or null
+  int reload;             // non-zero: reload the firewall
+  int update;             // non-zero: apply the changed ports (port forwarding)
+};
+
+// Tells the firewall service that service files changed: runs
+// "/usr/tavo/bin/tavofirewall --reload", followed by the old and the new file
+// when both are given, and waits. Returns 0 on success, the tool's non-zero
+// exit status, or -1 when it could not run or `notify` is null.
+int TLIBServiceConfServNotify(const TLIB_SERVCONF_NOTIFY* notify);
+
+#endif  // TAVO_TLIB_SERVICE_H_
