@@ -3,5 +3,7 @@
 #define TAVOW3_TAVOW3_H_
 
 #include <tavow3/export.h>
+#include <tavow3/engine_v2.h>
+#include <tavow3/engine_c.h>
 
 #endif  // TAVOW3_TAVOW3_H_
