@@ -61,6 +61,13 @@ TAVOW3_INTERNAL pid_t Fork();
 TAVOW3_INTERNAL pid_t WaitPid(pid_t pid, int* status, int options);
 // Exit status (0-255) from a raw wait status, -1 for a signal.
 TAVOW3_INTERNAL int ExitStatus(int raw_status);
+// kill(2).
+TAVOW3_INTERNAL bool Kill(pid_t pid, int sig);
+// _exit(2), for a forked child that must not run the parent's exit handlers.
+// Has no fault point: it cannot fail.
+[[noreturn]] TAVOW3_INTERNAL void Exit(int status);
+// Sleeps `seconds`, resuming after signals. Has no fault point: it cannot fail.
+TAVOW3_INTERNAL void SleepSeconds(unsigned seconds);
 
 }  // namespace tavow3::base
 

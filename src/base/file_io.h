@@ -22,7 +22,11 @@ TAVOW3_INTERNAL UniqueFd Open(const std::string& path, int flags, mode_t mode = 
 // mkstemp(3) on `pattern` (ending in "XXXXXX"); the created name goes to *path.
 TAVOW3_INTERNAL UniqueFd MakeTemp(const std::string& pattern, std::string* path);
 
-// Reads until end of file, appending to *out.
+// pipe2(2) with O_CLOEXEC; its fault point is kOpen. Leaves both outputs
+// unchanged on failure.
+TAVOW3_INTERNAL bool Pipe(UniqueFd* read_end, UniqueFd* write_end);
+
+// Reads until end of file, appending to *out (unchanged on failure).
 TAVOW3_INTERNAL bool ReadAll(int fd, std::string* out);
 // Reads up to `size` bytes once; returns the count or -1.
 TAVOW3_INTERNAL long ReadSome(int fd, char* buffer, unsigned long size);
