@@ -5,5 +5,8 @@
 #include <tavow3/export.h>
 #include <tavow3/engine_v2.h>
 #include <tavow3/engine_c.h>
+#include <tavow3/port_validator.h>
+#include <tavow3/tls_registration.h>
+#include <tavow3/validator.h>
 
 #endif  // TAVOW3_TAVOW3_H_
