@@ -1,8 +1,8 @@
 // Firewall library: named iptables module sets. A module set is a chain of
-// the filter table and its jump from INPUT; the only set plain Linux knows is
-// "ZAM_DEFAULT_SERVICE", the chain "ZAM_DEFAULT_FORWARD". The iptables
-// program is "/usr/bin/iptables". Not thread-safe against other writers of
-// the same chain.
+// the filter table and its jump, the first rule of INPUT; the only set plain
+// Linux knows is "ZAM_DEFAULT_SERVICE", the chain "ZAM_DEFAULT_FORWARD". The
+// iptables program is "/usr/bin/iptables". Not thread-safe against other
+// writers of the same chain.
 #ifndef TAVO_FIREWALL_H_
 #define TAVO_FIREWALL_H_
 

@@ -13,8 +13,11 @@
 //   protocol="tcp"
 //
 // `ports` is a comma-separated list of ports and inclusive ranges "A:B";
-// `protocol` is "tcp", "udp" or "udp,tcp". Blank lines and lines starting
-// with '#' or ';' are skipped. Values are unescaped: \" and \\ stand for " and \.
+// `protocol` is "tcp", "udp" or "udp,tcp" ("tcp,udp" and "" are accepted too).
+// Blank lines and lines starting with '#' or ';' are skipped, blanks around
+// names, keys and values are ignored, and keys this reader does not know are
+// skipped. Quoted values are unescaped: \" and \\ stand for " and \; a bare
+// value is taken as written.
 #ifndef TAVO_SERVICE_CONF_H_
 #define TAVO_SERVICE_CONF_H_
 
@@ -39,7 +42,9 @@ struct TAVO_SERVICE_CONF {
 
 // Reads the service file `path`. On success returns 0 and stores a new record
 // in `*conf`, which the caller frees with TAVOServiceConfFree. Returns -1 with
-// errno set (EINVAL for a malformed file) and leaves `*conf` unchanged.
+// errno set (EINVAL for a malformed file: a line that is neither a section
+// nor key=value, a key before the first section, an unterminated quote, a bad
+// port list or protocol) and leaves `*conf` unchanged.
 int TAVOServiceConfGet(const char* path, TAVO_SERVICE_CONF** conf);
 
 // Frees a record of TAVOServiceConfGet; null is ignored.
@@ -55,13 +60,15 @@ struct TAVO_SERVICE_PORTS {
 void TAVOServiceConfPortsFree(TAVO_SERVICE_PORTS* list);
 
 // Compares two comma-separated port lists (ports and "A:B" ranges; empty
-// entries, such as the one after a trailing comma, are skipped) for the
-// protocol `proto` ("tcp" or "udp"). Returns 0 when no port of `candidates` lies
+// entries, such as the one after a trailing comma, are skipped; ports are 1
+// to 65535) that both hold ports of the protocol `proto` ("tcp" or "udp").
+// Returns 0 and stores null in `*conflicts` when no port of `candidates` lies
 // in `claimed`. Returns 1 when some do and stores in `*conflicts` a new list
-// of those candidate ports in ascending order, at most `max_conflicts` of
-// them, which the caller frees with TAVOServiceConfPortsFree. Returns -1 with
-// errno EINVAL for a malformed list or protocol, storing nothing. The buffers
-// are not modified.
+// of those candidate ports, each once, in ascending order, at most
+// `max_conflicts` of them, which the caller frees with
+// TAVOServiceConfPortsFree. Returns -1 with errno EINVAL for a malformed list
+// or protocol, a `max_conflicts` below 1 or a null pointer, storing nothing.
+// The buffers are not modified.
 int TLIBIsPortConflict(char* claimed, char* candidates, const char* proto, int max_conflicts,
                        TAVO_SERVICE_PORTS** conflicts);
 

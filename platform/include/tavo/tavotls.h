@@ -2,8 +2,11 @@
 // profiles and their service levels, kept in one JSON data store
 // "/usr/tavo/etc/tls/services.json" that is replaced atomically. A store that
 // does not exist yet holds the system's own services at their default level:
-// the management interface "zam" at level 2. Calls are serialised between
-// processes by an exclusive flock on "/run/lock/tavotls.lock".
+// the management interface "zam" (display name "ZAM") at level 2. Changes are
+// serialised between processes and threads by an exclusive flock on
+// "/run/lock/tavotls.lock"; readers take no lock and see the old or the new
+// store. A store that exists but is not a valid store is never overwritten:
+// reads find nothing and changes fail.
 #ifndef TAVO_TAVOTLS_H_
 #define TAVO_TAVOTLS_H_
 
@@ -21,9 +24,10 @@ class APIProvider {
   // service joins at level 2 and keeps its level when it is already there.
   // Returns 0 on success, -1 on a malformed document or a store failure.
   static int join_framework(const Json::Value& document);
-  // Removes the service named by "service" of `document` (its other keys are
-  // ignored). Returns 0 on success, also when it was not there; -1 on a
-  // malformed document or a store failure.
+  // Removes the services named by "service" in the objects of the array
+  // "services" of `document` (other keys are ignored). Returns 0 on success,
+  // also when they were not there; -1 on a malformed document or a store
+  // failure.
   static int leave_framework(const Json::Value& document);
 };
 
@@ -36,8 +40,9 @@ class DataStoreProvider {
   // The level of `service`, or -1 when it is not registered or the store
   // cannot be read.
   static int get_service_level(const std::string& service);
-  // Sets the level (1 to 3) of `service`, registering it when missing.
-  // Returns 0 on success, -1 for a level out of range or a store failure.
+  // Sets the level (1 to 3) of `service`, registering it (with its name as the
+  // display name) when missing. Returns 0 on success, -1 for an empty name, a
+  // level out of range or a store failure.
   static int set_service_level(const std::string& service, int level);
 };
 

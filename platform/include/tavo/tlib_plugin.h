@@ -10,12 +10,12 @@
 struct TLIB_PLUGIN;
 
 // Opens the hook. Returns a new handle that TLIBPluginExit frees, or null with
-// errno set (EINVAL for an empty category or name).
+// errno set (EINVAL for a category or name that is not a single file name).
 TLIB_PLUGIN* TLIBPluginSDKInit(const char* category, const char* name);
 
 // Sets a string argument; a later value of the same key replaces the earlier.
-// Returns 0, or -1 with errno EINVAL for a null handle or a key that is empty
-// or holds anything but letters, digits and '_'.
+// Returns 0, or -1 with errno EINVAL for a null handle or value, or a key that
+// is empty or holds anything but letters, digits and '_'.
 int TLIBPluginSetArg(TLIB_PLUGIN* plugin, const char* key, const char* value);
 
 // Sets an integer argument, written in decimal. Results as TLIBPluginSetArg.
@@ -23,7 +23,9 @@ int TLIBPluginSetArgByInt(TLIB_PLUGIN* plugin, const char* key, int value);
 
 // Runs the hooks for `action` and waits for each. Returns 0 when every hook
 // exited 0 (or there is none), else the first non-zero exit status (-1 when a
-// hook could not run or died by a signal); later hooks still run.
+// hook could not run or died by a signal); later hooks still run. Also -1
+// when "/var/packages" exists but cannot be listed. Hooks get standard input
+// from /dev/null and no descriptor above 2.
 int TLIBPluginAction(TLIB_PLUGIN* plugin, int action);
 
 // Frees the handle; null is ignored.
