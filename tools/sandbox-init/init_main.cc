@@ -1,8 +1,10 @@
-// PID 1 of a sandbox (tools/sandbox execs it once the appliance is set up):
+// PID 1 of a sandbox, started by tools/sandbox in new PID, mount and network
+// namespaces:
 //
-//   tavow3-sandbox-init [--shell] -- COMMAND [ARG...]
+//   tavow3-sandbox-init --scratch DIR --root DIR [--keep] [--visible DIR]...
+//                       [--shell] -- COMMAND [ARG...]
 //
-// Starts the /dev/log sink, runs COMMAND, reaps every process that the
+// Sets up the appliance (appliance_setup.h), starts the /dev/log sink, runs COMMAND, reaps every process that the
 // namespace hands to it, forwards SIGINT/SIGTERM/SIGHUP/SIGQUIT to COMMAND and
 // exits with COMMAND's status (128 + N for signal N). With --shell an
 // interactive shell follows COMMAND, or replaces it when none is given. On exit
@@ -18,6 +20,7 @@
 #include <string>
 #include <vector>
 
+#include "appliance_setup.h"
 #include "syslog_sink.h"
 
 namespace {
@@ -86,32 +89,48 @@ void KillTheRest() {
   }
 }
 
+int Usage() {
+  std::fprintf(stderr,
+               "usage: tavow3-sandbox-init --scratch DIR --root DIR [--keep] [--visible DIR]...\n"
+               "                           [--shell] -- COMMAND [ARG...]\n");
+  return 125;
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
+  tavow3::sandbox::SetupOptions options;
   bool shell = false;
   int first = 1;
   for (; first < argc; ++first) {
     std::string arg = argv[first];
+    bool has_value = first + 1 < argc;
     if (arg == "--shell") {
       shell = true;
+    } else if (arg == "--keep") {
+      options.keep = true;
+    } else if (arg == "--scratch" && has_value) {
+      options.scratch = argv[++first];
+    } else if (arg == "--root" && has_value) {
+      options.root = argv[++first];
+    } else if (arg == "--visible" && has_value) {
+      options.visible.push_back(argv[++first]);
     } else if (arg == "--") {
       ++first;
       break;
     } else {
-      std::fprintf(stderr, "usage: tavow3-sandbox-init [--shell] -- COMMAND [ARG...]\n");
-      return 125;
+      return Usage();
     }
   }
   std::vector<char*> command(argv + first, argv + argc);
-  if (command.empty() && !shell) {
-    std::fprintf(stderr, "usage: tavow3-sandbox-init [--shell] -- COMMAND [ARG...]\n");
-    return 125;
+  if ((command.empty() && !shell) || options.scratch.empty() || options.root.empty()) {
+    return Usage();
   }
   if (::getpid() != 1) {
     std::fprintf(stderr, "sandbox-init: must run as PID 1 of a new PID namespace\n");
     return 125;
   }
+  if (!tavow3::sandbox::SetUpAppliance(options)) return 125;
   if (::mkdir(kLogDir, 0755) != 0 && errno != EEXIST) {
     std::fprintf(stderr, "sandbox-init: mkdir %s: %s\n", kLogDir, std::strerror(errno));
     return 125;

@@ -1,0 +1,30 @@
+// Turns a fresh mount and network namespace into a throwaway appliance.
+#ifndef TAVOW3_TOOLS_SANDBOX_INIT_APPLIANCE_SETUP_H_
+#define TAVOW3_TOOLS_SANDBOX_INIT_APPLIANCE_SETUP_H_
+
+#include <string>
+#include <vector>
+
+namespace tavow3::sandbox {
+
+struct SetupOptions {
+  std::string scratch;  // an empty host directory for the overlays' upper layers
+  std::string root;     // the staged tree copied over /
+  bool keep = false;    // keep the scratch on the host's disk instead of a tmpfs
+  // Host directories under /tmp or /run (the build, the sources, the working
+  // directory) that stay visible at their paths once those trees are replaced.
+  std::vector<std::string> visible;
+};
+
+// Must run as PID 1 of new PID, mount and network namespaces. Makes every
+// mount private (making / a mount point first when it is not one, as in a
+// chroot), mounts a fresh /proc, overlays /usr, /etc and /var with upper
+// layers under options.scratch, replaces /dev, /dev/shm, /run and /tmp,
+// creates the appliance's directories and the /usr/bin links to nginx and
+// iptables, brings loopback up, copies options.root over / and returns to the
+// working directory. Returns false with a message on stderr.
+bool SetUpAppliance(const SetupOptions& options);
+
+}  // namespace tavow3::sandbox
+
+#endif  // TAVOW3_TOOLS_SANDBOX_INIT_APPLIANCE_SETUP_H_
