@@ -180,12 +180,12 @@ TEST(TavoPlatform, TlsLevelsGoThroughTheStore) {
 
 TEST(TavoPlatform, ServiceFilesAndPortLists) {
   WriteFile("/tmp/demo.sc",
-            "[ZAM_5000]\ntitle=\"HTTP\"\ndesc=\"ZAM\"\nports=\"5000,8000:8010\"\n"
+            "[ZAM_5000]\ntitle=\"HTTP\"\ndesc=\"Z \\\"A\\\" \\\\M\"\nports=\"5000,8000:8010\"\n"
             "protocol=\"tcp\"\n\n[extra]\nports=\"53\"\nprotocol=\"udp\"\n");
   Result read = Tool({"sc-read", "/tmp/demo.sc"});
   EXPECT_EQ(0, read.status);
   EXPECT_EQ(
-      "[ZAM_5000] ports=5000,8000:8010 protocol=tcp title=\"HTTP\" desc=\"ZAM\"\n"
+      "[ZAM_5000] ports=5000,8000:8010 protocol=tcp title=\"HTTP\" desc=\"Z \\\"A\\\" \\\\M\"\n"
       "[extra] ports=53 protocol=udp title=\"\" desc=\"\"\n"
       "2 sections, ports 5000,8000:8010,53\n",
       read.out);

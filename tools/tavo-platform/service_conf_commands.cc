@@ -29,6 +29,17 @@ std::string Join(char** items, int count) {
   return joined;
 }
 
+// A value in double quotes, escaped as the file writes it, so the line reads
+// back as the same value.
+std::string Quoted(const char* value) {
+  std::string quoted = "\"";
+  for (const char* c = value; *c != '\0'; ++c) {
+    if (*c == '"' || *c == '\\') quoted += '\\';
+    quoted += *c;
+  }
+  return quoted + '"';
+}
+
 }  // namespace
 
 int ServiceConfRead(const Args& args) {
@@ -38,9 +49,9 @@ int ServiceConfRead(const Args& args) {
   std::unique_ptr<TAVO_SERVICE_CONF, ConfFree> conf(raw);
   for (int i = 0; i < conf->section_count; ++i) {
     const TAVO_SERVICE_SECTION& section = conf->sections[i];
-    std::printf("[%s] ports=%s protocol=%s title=\"%s\" desc=\"%s\"\n", section.name,
-                Join(section.ports, section.port_count).c_str(), section.protocol, section.title,
-                section.desc);
+    std::printf("[%s] ports=%s protocol=%s title=%s desc=%s\n", section.name,
+                Join(section.ports, section.port_count).c_str(), section.protocol,
+                Quoted(section.title).c_str(), Quoted(section.desc).c_str());
   }
   std::printf("%d sections, ports %s\n", conf->section_count,
               Join(conf->ports, conf->port_count).c_str());
