@@ -1,0 +1,20 @@
+// File input and output of tavomustache.
+#ifndef TAVO_APPLIANCE_MUSTACHE_OUTPUT_FILE_H_
+#define TAVO_APPLIANCE_MUSTACHE_OUTPUT_FILE_H_
+
+#include <string>
+
+namespace tavomustache {
+
+// Reads the whole file `path` into *content. False with a message in *error.
+bool ReadWholeFile(const std::string& path, std::string* content, std::string* error);
+
+// Replaces `path` by `content` (mode 0644): a temporary file beside it is
+// written, flushed to disk and renamed over it, so readers see the old or the
+// new file. False with a message in *error; `path` is then unchanged and the
+// temporary removed.
+bool WriteFileAtomically(const std::string& path, const std::string& content, std::string* error);
+
+}  // namespace tavomustache
+
+#endif  // TAVO_APPLIANCE_MUSTACHE_OUTPUT_FILE_H_
