@@ -35,6 +35,9 @@ constexpr const char* kSbinTools[] = {"nginx", "iptables"};
 // The only trees a staged file may land in: all of them are private.
 constexpr const char* kStagedTrees[] = {"usr", "etc", "var", "run", "tmp"};
 constexpr const char* kOverlaid[] = {"usr", "etc", "var"};
+// The scratch (upper layers, /run, /tmp, /dev/shm) is mounted on /tmp until
+// /tmp/tmp covers it: no host directory is needed for it.
+constexpr char kScratch[] = "/tmp";
 
 struct DeviceNode {
   const char* name;
@@ -129,10 +132,6 @@ bool ReplaceDev(const std::string& dev, const std::string& shm) {
 }
 
 bool MountOverlays(const std::string& scratch) {
-  if (scratch.find_first_of(",:\\") != std::string::npos) {
-    errno = EINVAL;
-    return Fail("unusable scratch directory", scratch);
-  }
   for (const char* dir : kOverlaid) {
     std::string layer = scratch + "/" + dir;
     if (!MakeDir(layer, 0755) || !MakeDir(layer + "/upper", 0755) ||
@@ -146,25 +145,33 @@ bool MountOverlays(const std::string& scratch) {
   return true;
 }
 
-// Replaces /run and /tmp with directories of the scratch, keeping the host
-// directories in `visible` (under /tmp or /run) at their paths.
-bool ReplaceRunAndTmp(const std::string& scratch, std::vector<std::string> visible) {
+using KeptDirs = std::vector<std::pair<std::string, int>>;
+
+// Opens the host directories of `visible` under /tmp or /run (outermost ones
+// only), before anything covers them.
+bool OpenVisible(std::vector<std::string> visible, KeptDirs* kept) {
   std::sort(visible.begin(), visible.end());
-  std::vector<std::pair<std::string, int>> kept;
   for (const std::string& path : visible) {
     if (!IsUnder(path, "/tmp") && !IsUnder(path, "/run")) continue;
-    if (!kept.empty() && (path == kept.back().first || IsUnder(path, kept.back().first))) continue;
+    if (!kept->empty() && (path == kept->back().first || IsUnder(path, kept->back().first))) {
+      continue;
+    }
     int fd = ::open(path.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC);
     if (fd < 0) return Fail("cannot open", path);
-    kept.emplace_back(path, fd);
+    kept->emplace_back(path, fd);
   }
+  return true;
+}
+
+// Replaces /run and /tmp with directories of the scratch, then puts the kept
+// host directories back at their paths.
+bool ReplaceRunAndTmp(const std::string& scratch, const KeptDirs& kept) {
   bool ok = MakeDir(scratch + "/run", 0755) && MakeDir(scratch + "/tmp", 01777) &&
             Mount(scratch + "/run", "/run", nullptr, MS_BIND) &&
             Mount(scratch + "/tmp", "/tmp", nullptr, MS_BIND);
   for (const auto& [path, fd] : kept) {
     ok = ok && MakeDirs(path, 0755) &&
          Mount("/proc/self/fd/" + std::to_string(fd), path, nullptr, MS_BIND | MS_REC);
-    ::close(fd);
   }
   return ok;
 }
@@ -228,18 +235,23 @@ bool SetUpAppliance(const SetupOptions& options) {
   // Opened before anything covers it: the tree may lie under /tmp.
   int root_fd = ::open(options.root.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
   if (root_fd < 0) return Fail("cannot open", options.root);
-  const std::string& scratch = options.scratch;
+  const std::string scratch = kScratch;
   const mode_t saved_umask = ::umask(0);  // directory modes such as 01777 as written
+  KeptDirs kept;
   struct stat st {};
-  bool ok = MakeMountsPrivate();
+  bool ok = OpenVisible(options.visible, &kept) && MakeMountsPrivate();
   if (ok && ::stat("/proc", &st) != 0) ok = Fail("missing mount point", "/proc");
   ok = ok && Mount("proc", "/proc", "proc", MS_NOSUID | MS_NODEV | MS_NOEXEC);
-  if (ok && !options.keep) ok = Mount("tavow3-sandbox", scratch, "tmpfs", 0, "mode=0700");
+  if (ok && ::stat(kScratch, &st) != 0) ok = Fail("missing mount point", kScratch);
+  if (ok) {
+    ok = options.keep_dir.empty() ? Mount("tavow3-sandbox", scratch, "tmpfs", 0, "mode=0700")
+                                  : Mount(options.keep_dir, scratch, nullptr, MS_BIND);
+  }
   ok = ok && MountOverlays(scratch) && MakeDir(scratch + "/shm", 01777) &&
-       ReplaceDev(scratch + "/dev", scratch + "/shm") &&
-       ReplaceRunAndTmp(scratch, options.visible);  // last: scratch may lie under /tmp
+       ReplaceDev(scratch + "/dev", scratch + "/shm") && ReplaceRunAndTmp(scratch, kept);
   for (const char* dir : kApplianceDirs) ok = ok && MakeDirs(dir, 0755);
   ok = ok && LinkSbinTools() && BringLoopbackUp() && StageTree(root_fd, options.root);
+  for (const auto& entry : kept) ::close(entry.second);
   ::close(root_fd);
   ::umask(saved_umask);
   if (!ok) return false;

@@ -8,9 +8,11 @@
 namespace tavow3::sandbox {
 
 struct SetupOptions {
-  std::string scratch;  // an empty host directory for the overlays' upper layers
-  std::string root;     // the staged tree copied over /
-  bool keep = false;    // keep the scratch on the host's disk instead of a tmpfs
+  std::string root;  // the staged tree copied over /
+  // A host directory that receives the scratch (the overlays' upper layers,
+  // /run, /tmp, /dev/shm) and keeps it after the run. When empty, the scratch
+  // is a tmpfs that vanishes with the mount namespace.
+  std::string keep_dir;
   // Host directories under /tmp or /run (the build, the sources, the working
   // directory) that stay visible at their paths once those trees are replaced.
   std::vector<std::string> visible;
@@ -18,8 +20,8 @@ struct SetupOptions {
 
 // Must run as PID 1 of new PID, mount and network namespaces. Makes every
 // mount private (making / a mount point first when it is not one, as in a
-// chroot), mounts a fresh /proc, overlays /usr, /etc and /var with upper
-// layers under options.scratch, replaces /dev, /dev/shm, /run and /tmp,
+// chroot), mounts a fresh /proc, overlays /usr, /etc and /var, replaces
+// /dev, /dev/shm, /run and /tmp,
 // creates the appliance's directories and the /usr/bin links to nginx and
 // iptables, brings loopback up, copies options.root over / and returns to the
 // working directory. Returns false with a message on stderr.

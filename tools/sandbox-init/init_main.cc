@@ -1,8 +1,8 @@
 // PID 1 of a sandbox, started by tools/sandbox in new PID, mount and network
 // namespaces:
 //
-//   tavow3-sandbox-init --scratch DIR --root DIR [--keep] [--visible DIR]...
-//                       [--shell] -- COMMAND [ARG...]
+//   tavow3-sandbox-init --root DIR [--keep DIR] [--visible DIR]... [--shell]
+//                       -- COMMAND [ARG...]
 //
 // Sets up the appliance (appliance_setup.h), starts the /dev/log sink, runs COMMAND, reaps every process that the
 // namespace hands to it, forwards SIGINT/SIGTERM/SIGHUP/SIGQUIT to COMMAND and
@@ -91,8 +91,8 @@ void KillTheRest() {
 
 int Usage() {
   std::fprintf(stderr,
-               "usage: tavow3-sandbox-init --scratch DIR --root DIR [--keep] [--visible DIR]...\n"
-               "                           [--shell] -- COMMAND [ARG...]\n");
+               "usage: tavow3-sandbox-init --root DIR [--keep DIR] [--visible DIR]... [--shell]\n"
+               "                           -- COMMAND [ARG...]\n");
   return 125;
 }
 
@@ -107,10 +107,8 @@ int main(int argc, char** argv) {
     bool has_value = first + 1 < argc;
     if (arg == "--shell") {
       shell = true;
-    } else if (arg == "--keep") {
-      options.keep = true;
-    } else if (arg == "--scratch" && has_value) {
-      options.scratch = argv[++first];
+    } else if (arg == "--keep" && has_value) {
+      options.keep_dir = argv[++first];
     } else if (arg == "--root" && has_value) {
       options.root = argv[++first];
     } else if (arg == "--visible" && has_value) {
@@ -123,7 +121,7 @@ int main(int argc, char** argv) {
     }
   }
   std::vector<char*> command(argv + first, argv + argc);
-  if ((command.empty() && !shell) || options.scratch.empty() || options.root.empty()) {
+  if ((command.empty() && !shell) || options.root.empty()) {
     return Usage();
   }
   if (::getpid() != 1) {
