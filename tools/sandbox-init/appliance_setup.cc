@@ -14,6 +14,7 @@
 
 #include <algorithm>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 #include <utility>
 
@@ -147,9 +148,15 @@ bool MountOverlays(const std::string& scratch) {
 
 using KeptDirs = std::vector<std::pair<std::string, int>>;
 
-// Opens the host directories of `visible` under /tmp or /run (outermost ones
-// only), before anything covers them.
-bool OpenVisible(std::vector<std::string> visible, KeptDirs* kept) {
+// Opens the host directories of `wanted` and the working directory `cwd` that
+// lie under /tmp or /run (outermost ones only), before anything covers them.
+bool OpenVisible(const std::vector<std::string>& wanted, const std::string& cwd,
+                 KeptDirs* kept) {
+  std::vector<std::string> visible = {cwd};
+  for (const std::string& path : wanted) {
+    char resolved[PATH_MAX];
+    if (::realpath(path.c_str(), resolved) != nullptr) visible.push_back(resolved);
+  }
   std::sort(visible.begin(), visible.end());
   for (const std::string& path : visible) {
     if (!IsUnder(path, "/tmp") && !IsUnder(path, "/run")) continue;
@@ -239,7 +246,7 @@ bool SetUpAppliance(const SetupOptions& options) {
   const mode_t saved_umask = ::umask(0);  // directory modes such as 01777 as written
   KeptDirs kept;
   struct stat st {};
-  bool ok = OpenVisible(options.visible, &kept) && MakeMountsPrivate();
+  bool ok = OpenVisible(options.visible, cwd, &kept) && MakeMountsPrivate();
   if (ok && ::stat("/proc", &st) != 0) ok = Fail("missing mount point", "/proc");
   ok = ok && Mount("proc", "/proc", "proc", MS_NOSUID | MS_NODEV | MS_NOEXEC);
   if (ok && ::stat(kScratch, &st) != 0) ok = Fail("missing mount point", kScratch);

@@ -13,8 +13,9 @@ struct SetupOptions {
   // /run, /tmp, /dev/shm) and keeps it after the run. When empty, the scratch
   // is a tmpfs that vanishes with the mount namespace.
   std::string keep_dir;
-  // Host directories under /tmp or /run (the build, the sources, the working
-  // directory) that stay visible at their paths once those trees are replaced.
+  // Host directories (the build, the sources, the command's) that stay visible
+  // at their real paths when they lie under /tmp or /run, which the sandbox
+  // replaces; the working directory always does. Missing ones are ignored.
   std::vector<std::string> visible;
 };
 

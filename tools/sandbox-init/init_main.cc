@@ -10,12 +10,14 @@
 // interactive shell follows COMMAND, or replaces it when none is given. On exit
 // every process left in the namespace is killed.
 #include <errno.h>
+#include <limits.h>
 #include <signal.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 #include <string>
 #include <vector>
@@ -123,6 +125,12 @@ int main(int argc, char** argv) {
   std::vector<char*> command(argv + first, argv + argc);
   if ((command.empty() && !shell) || options.root.empty()) {
     return Usage();
+  }
+  char command_path[PATH_MAX];
+  if (!command.empty() && std::strchr(command[0], '/') != nullptr &&
+      ::realpath(command[0], command_path) != nullptr) {
+    options.visible.push_back(std::string(command_path).substr(
+        0, std::string(command_path).rfind('/')));
   }
   if (::getpid() != 1) {
     std::fprintf(stderr, "sandbox-init: must run as PID 1 of a new PID namespace\n");
