@@ -16,6 +16,8 @@
 
 #include <gtest/gtest.h>
 
+#include "support/syslog_capture.h"
+
 namespace tavow3::test {
 
 const char kGeneratorScript[] = "/usr/tavo/etc/rc.sysv/nginx-conf-generator.sh";
@@ -109,6 +111,14 @@ std::vector<std::string> IptablesRules() {
   std::vector<std::string> lines;
   std::istringstream in(text);
   for (std::string line; std::getline(in, line);) lines.push_back(line);
+  return lines;
+}
+
+std::vector<std::string> DeployLog() {
+  std::vector<std::string> lines;
+  for (const std::string& line : LogMessages()) {
+    if (line.rfind("nginx_deploy:", 0) == 0) lines.push_back(line);
+  }
   return lines;
 }
 

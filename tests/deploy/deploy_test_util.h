@@ -33,6 +33,9 @@ int RunProgram(const std::vector<std::string>& argv, std::string* output = nullp
 // Lines of "iptables -S" in this sandbox.
 std::vector<std::string> IptablesRules();
 
+// The lines logged with the tag "nginx_deploy" since the last ClearLog().
+std::vector<std::string> DeployLog();
+
 // Polls `done` every 10 ms until it is true or `timeout` passed; its last value.
 bool WaitUntil(const std::function<bool()>& done,
                std::chrono::milliseconds timeout = std::chrono::seconds(10));

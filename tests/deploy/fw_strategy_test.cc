@@ -34,14 +34,6 @@ bool ChainIsGone() {
   return true;
 }
 
-std::vector<std::string> DeployLog() {
-  std::vector<std::string> lines;
-  for (const std::string& line : LogMessages()) {
-    if (line.rfind("nginx_deploy:", 0) == 0) lines.push_back(line);
-  }
-  return lines;
-}
-
 // Puts a stand-in before the real iptables that fails (exit 1) every run
 // whose arguments begin with the text in kFailPatternFile, and passes the
 // others on. The library's own runs begin with the operation ("-A", "-F");

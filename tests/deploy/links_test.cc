@@ -23,14 +23,6 @@ using deploy::RemovePath;
 constexpr char kTarget[] = "/tmp/links/target";
 constexpr char kLink[] = "/tmp/links/link";
 
-std::vector<std::string> DeployLog() {
-  std::vector<std::string> lines;
-  for (const std::string& line : LogMessages()) {
-    if (line.rfind("nginx_deploy:", 0) == 0) lines.push_back(line);
-  }
-  return lines;
-}
-
 void Symlink(const std::string& target, const std::string& link) {
   ASSERT_EQ(0, ::symlink(target.c_str(), link.c_str())) << link;
 }

@@ -27,15 +27,6 @@ std::string Record(const std::string& text) {
   return bytes;
 }
 
-// The lines this library logged since the last ClearLog().
-std::vector<std::string> DeployLog() {
-  std::vector<std::string> lines;
-  for (const std::string& line : LogMessages()) {
-    if (line.rfind("nginx_deploy:", 0) == 0) lines.push_back(line);
-  }
-  return lines;
-}
-
 // GetMode() as a separate process sees it.
 int ModeInChild() {
   const pid_t pid = ::fork();

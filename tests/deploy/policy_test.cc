@@ -19,14 +19,6 @@ namespace {
 constexpr char kAppD[] = "/etc/nginx/app.d";
 constexpr char kConfD[] = "/etc/nginx/conf.d";
 
-std::vector<std::string> DeployLog() {
-  std::vector<std::string> lines;
-  for (const std::string& line : LogMessages()) {
-    if (line.rfind("nginx_deploy:", 0) == 0) lines.push_back(line);
-  }
-  return lines;
-}
-
 // The packaged directories under /etc/nginx are replaced by links; they are
 // removed here because the sandbox's overlay cannot rename them (EXDEV).
 void PrepareGeneratedTree() {
