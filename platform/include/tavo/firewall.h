@@ -12,8 +12,10 @@ namespace FW {
 
 class TAVO_IPTABLES_MODULES {
  public:
+  // Not virtual: the class has no virtual operation of its own, so a class
+  // that derives from it lays its own virtual operations out first.
   TAVO_IPTABLES_MODULES() = default;
-  virtual ~TAVO_IPTABLES_MODULES() = default;
+  ~TAVO_IPTABLES_MODULES() = default;
 
   // True when the set's chain exists and INPUT jumps to it.
   bool isModuleLoad(const std::string& name);
