@@ -243,8 +243,8 @@ int Helper(const std::string& name, const std::string& arg) {
 
 TEST(Sandbox, LeavesTheHostUnchanged) {
   const std::string token = Token();
-  std::vector<std::string> watched = {"/usr/tavo", "/usr/bin/nginx", "/usr/bin/iptables",
-                                      "/dev/log", "/dev/shm/nginx_mod", "/run/tavow3-sandbox",
+  std::vector<std::string> watched = {"/usr/tavo",   "/usr/bin/nginx",        "/usr/bin/iptables",
+                                      "/dev/log",    "/dev/shm/nginx_mod",    "/run/tavow3-sandbox",
                                       "/run/tavow3", "/run/lock/tavow3.lock", "/var/tmp/nginx"};
   for (const char* dir : {"/usr/tavo", "/etc", "/var", "/run", "/tmp", "/dev", "/usr/bin"}) {
     watched.push_back(std::string(dir) + "/" + token);
@@ -287,7 +287,8 @@ TEST(Sandbox, PassesTheExitStatusThrough) {
 }
 
 TEST(Sandbox, PassesStandardStreamsThrough) {
-  Result result = RunSandbox({"/bin/sh", "-c", "read line; echo \"got $line\"; echo $$"}, "hello\n");
+  Result result =
+      RunSandbox({"/bin/sh", "-c", "read line; echo \"got $line\"; echo $$"}, "hello\n");
   EXPECT_EQ(0, result.status);
   EXPECT_EQ("got hello\n3\n", result.out) << "the command is the third process: init, sink, it";
 }

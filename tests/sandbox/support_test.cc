@@ -57,7 +57,7 @@ int RunFake(const std::string& path, const std::vector<std::string>& argv) {
 std::string FakePath(const std::string& tool) { return "/usr/tavo/bin/" + tool; }
 
 TEST(LogMessages, KeepsEachPriorityApart) {
-  const int priorities[] = {LOG_EMERG, LOG_ALERT, LOG_CRIT,  LOG_ERR,
+  const int priorities[] = {LOG_EMERG,   LOG_ALERT,  LOG_CRIT, LOG_ERR,
                             LOG_WARNING, LOG_NOTICE, LOG_INFO, LOG_DEBUG};
   for (int priority : priorities) ::syslog(priority, "message at %d", priority);
   ::syslog(LOG_DAEMON | LOG_ERR, "daemon facility");
@@ -76,14 +76,15 @@ TEST(LogMessages, KeepsEachPriorityApart) {
 TEST(LogMessages, ReturnsTheLibraryLineWithoutTheHeader) {
   base::Log(LOG_ERR, kLogTag, 317, "Runtime port %d conflict for %s", 80, "nginx");
   TAVOW3_LOG_ERR_AT(42, "with: a colon");
-  EXPECT_THAT(LogMessages(LOG_ERR),
-              ElementsAre("engine:317 Runtime port 80 conflict for nginx", "engine:42 with: a colon"));
+  EXPECT_THAT(LogMessages(LOG_ERR), ElementsAre("engine:317 Runtime port 80 conflict for nginx",
+                                                "engine:42 with: a colon"));
 }
 
 TEST(LogMessages, KeepsAwkwardTextWhole) {
-  const std::vector<std::string> texts = {
-      "two\nlines", "back\\slash and \\n literally", "trailing space ", "ünïcødé ✓",
-      "x: looks like a tag", "tab\there", std::string(3000, 'w')};
+  const std::vector<std::string> texts = {"two\nlines",          "back\\slash and \\n literally",
+                                          "trailing space ",     "ünïcødé ✓",
+                                          "x: looks like a tag", "tab\there",
+                                          std::string(3000, 'w')};
   for (const std::string& text : texts) ::syslog(LOG_WARNING, "%s", text.c_str());
   EXPECT_EQ(texts, LogMessages(LOG_WARNING));
 }
@@ -138,9 +139,16 @@ TEST(ClearLog, ForgetsOnlyWhatCameBefore) {
 }
 
 TEST(FakeCalls, RecordsAwkwardArgumentsExactly) {
-  const std::vector<std::string> args = {
-      "", "quote\"d", "new\nline", "back\\slash", "ünïcødé ✓", "\xff\xfe not UTF-8",
-      "tab\tand\rreturn", "--check-all-folders", "[\"json\",1]", std::string(5000, 'a')};
+  const std::vector<std::string> args = {"",
+                                         "quote\"d",
+                                         "new\nline",
+                                         "back\\slash",
+                                         "ünïcødé ✓",
+                                         "\xff\xfe not UTF-8",
+                                         "tab\tand\rreturn",
+                                         "--check-all-folders",
+                                         "[\"json\",1]",
+                                         std::string(5000, 'a')};
   std::vector<std::string> argv = {"any-argv0"};
   argv.insert(argv.end(), args.begin(), args.end());
   EXPECT_EQ(0, RunFake(FakePath("tavouserhome"), argv));
@@ -172,7 +180,8 @@ TEST(FakeCalls, KeepsConcurrentRunsWhole) {
     ASSERT_GE(child, 0);
     if (child == 0) {
       for (int i = 0; i < kRunsEach; ++i) {
-        if (RunFake(FakePath("tavozamnotify"), {"tavozamnotify", std::to_string(p), long_arg}) != 0) {
+        if (RunFake(FakePath("tavozamnotify"), {"tavozamnotify", std::to_string(p), long_arg}) !=
+            0) {
           ::_exit(1);
         }
       }

@@ -54,9 +54,9 @@ bool IsTimestamp(const std::string& text, size_t at) {
   const char* t = text.c_str() + at;
   auto digit = [](char c) { return c >= '0' && c <= '9'; };
   return std::isalpha(static_cast<unsigned char>(t[0])) && t[3] == ' ' &&
-         (t[4] == ' ' || digit(t[4])) && digit(t[5]) && t[6] == ' ' && digit(t[7]) &&
-         digit(t[8]) && t[9] == ':' && digit(t[10]) && digit(t[11]) && t[12] == ':' &&
-         digit(t[13]) && digit(t[14]) && t[15] == ' ';
+         (t[4] == ' ' || digit(t[4])) && digit(t[5]) && t[6] == ' ' && digit(t[7]) && digit(t[8]) &&
+         t[9] == ':' && digit(t[10]) && digit(t[11]) && t[12] == ':' && digit(t[13]) &&
+         digit(t[14]) && t[15] == ' ';
 }
 
 // "<PRI>Mmm dd hh:mm:ss tag[pid]: message"; the tag and pid are optional and a
@@ -88,8 +88,8 @@ std::string NewMarker() {
   static std::atomic<unsigned> counter{0};
   timespec now{};
   clock_gettime(CLOCK_REALTIME, &now);
-  return kMarkerPrefix + std::to_string(::getpid()) + "." +
-         std::to_string(counter++) + "." + std::to_string(now.tv_nsec);
+  return kMarkerPrefix + std::to_string(::getpid()) + "." + std::to_string(counter++) + "." +
+         std::to_string(now.tv_nsec);
 }
 
 // Reads entries from `start` on. Sets *marker_end to the offset just past the

@@ -24,12 +24,21 @@ namespace tavow3::sandbox {
 namespace {
 
 constexpr const char* kApplianceDirs[] = {
-    "/usr/tavo/bin",           "/usr/tavo/etc/www",        "/usr/tavo/etc/services.d",
-    "/usr/tavo/etc/rc.sysv",   "/usr/tavo/etc.defaults/www", "/usr/tavo/share/nginx",
-    "/usr/tavo/share/certificate.d", "/usr/local/etc/services.d",
-    "/usr/local/etc/nginx/conf.d",   "/usr/local/etc/nginx/sites-enabled",
-    "/var/tmp/nginx",          "/var/tmp/tavow3",          "/run/lock",
-    "/run/tavow3",             "/var/packages",
+    "/usr/tavo/bin",
+    "/usr/tavo/etc/www",
+    "/usr/tavo/etc/services.d",
+    "/usr/tavo/etc/rc.sysv",
+    "/usr/tavo/etc.defaults/www",
+    "/usr/tavo/share/nginx",
+    "/usr/tavo/share/certificate.d",
+    "/usr/local/etc/services.d",
+    "/usr/local/etc/nginx/conf.d",
+    "/usr/local/etc/nginx/sites-enabled",
+    "/var/tmp/nginx",
+    "/var/tmp/tavow3",
+    "/var/packages",
+    "/run/lock",
+    "/run/tavow3",
 };
 // Debian keeps these under /usr/sbin; the appliance runs them from /usr/bin.
 constexpr const char* kSbinTools[] = {"nginx", "iptables"};
@@ -45,7 +54,7 @@ struct DeviceNode {
   unsigned major;
   unsigned minor;
 };
-constexpr DeviceNode kDevices[] = {{"null", 1, 3},    {"zero", 1, 5},    {"full", 1, 7},
+constexpr DeviceNode kDevices[] = {{"null", 1, 3},   {"zero", 1, 5},    {"full", 1, 7},
                                    {"random", 1, 8}, {"urandom", 1, 9}, {"tty", 5, 0}};
 
 bool Fail(const std::string& what, const std::string& path) {
@@ -56,8 +65,8 @@ bool Fail(const std::string& what, const std::string& path) {
 
 bool Mount(const std::string& source, const std::string& target, const char* type,
            unsigned long flags, const std::string& data = "") {
-  if (::mount(source.c_str(), target.c_str(), type, flags,
-              data.empty() ? nullptr : data.c_str()) == 0) {
+  if (::mount(source.c_str(), target.c_str(), type, flags, data.empty() ? nullptr : data.c_str()) ==
+      0) {
     return true;
   }
   return Fail("cannot mount " + source + " on", target);
@@ -138,8 +147,8 @@ bool MountOverlays(const std::string& scratch) {
     if (!MakeDir(layer, 0755) || !MakeDir(layer + "/upper", 0755) ||
         !MakeDir(layer + "/work", 0755) ||
         !Mount(std::string("tavow3-") + dir, std::string("/") + dir, "overlay", 0,
-               "lowerdir=/" + std::string(dir) + ",upperdir=" + layer +
-                   "/upper,workdir=" + layer + "/work")) {
+               "lowerdir=/" + std::string(dir) + ",upperdir=" + layer + "/upper,workdir=" + layer +
+                   "/work")) {
       return false;
     }
   }
@@ -150,8 +159,7 @@ using KeptDirs = std::vector<std::pair<std::string, int>>;
 
 // Opens the host directories of `wanted` and the working directory `cwd` that
 // lie under /tmp or /run (outermost ones only), before anything covers them.
-bool OpenVisible(const std::vector<std::string>& wanted, const std::string& cwd,
-                 KeptDirs* kept) {
+bool OpenVisible(const std::vector<std::string>& wanted, const std::string& cwd, KeptDirs* kept) {
   std::vector<std::string> visible = {cwd};
   for (const std::string& path : wanted) {
     char resolved[PATH_MAX];
@@ -217,8 +225,10 @@ bool StageTree(int root_fd, const std::string& root) {
     if (name == "." || name == "..") continue;
     if (std::find(std::begin(kStagedTrees), std::end(kStagedTrees), name) ==
         std::end(kStagedTrees)) {
-      std::fprintf(stderr, "sandbox-init: cannot stage %s/%s: only usr, etc, var, run and tmp "
-                   "are private to the sandbox\n", root.c_str(), name.c_str());
+      std::fprintf(stderr,
+                   "sandbox-init: cannot stage %s/%s: only usr, etc, var, run and tmp "
+                   "are private to the sandbox\n",
+                   root.c_str(), name.c_str());
       ok = false;
       break;
     }

@@ -4,11 +4,12 @@
 //   tavow3-sandbox-init --root DIR [--keep DIR] [--visible DIR]... [--shell]
 //                       -- COMMAND [ARG...]
 //
-// Sets up the appliance (appliance_setup.h), starts the /dev/log sink, runs COMMAND, reaps every process that the
-// namespace hands to it, forwards SIGINT/SIGTERM/SIGHUP/SIGQUIT to COMMAND and
-// exits with COMMAND's status (128 + N for signal N). With --shell an
-// interactive shell follows COMMAND, or replaces it when none is given. On exit
-// every process left in the namespace is killed.
+// Sets up the appliance (appliance_setup.h), starts the /dev/log sink, runs
+// COMMAND, reaps every process that the namespace hands to it, forwards
+// SIGINT/SIGTERM/SIGHUP/SIGQUIT to COMMAND and exits with COMMAND's status
+// (128 + N for signal N). With --shell an interactive shell follows COMMAND,
+// or replaces it when none is given. On exit every process left in the
+// namespace is killed.
 #include <errno.h>
 #include <limits.h>
 #include <signal.h>
@@ -98,45 +99,54 @@ int Usage() {
   return 125;
 }
 
-}  // namespace
-
-int main(int argc, char** argv) {
-  tavow3::sandbox::SetupOptions options;
+struct Arguments {
+  tavow3::sandbox::SetupOptions setup;
   bool shell = false;
+  std::vector<char*> command;
+};
+
+bool ParseArguments(int argc, char** argv, Arguments* args) {
   int first = 1;
   for (; first < argc; ++first) {
     std::string arg = argv[first];
     bool has_value = first + 1 < argc;
     if (arg == "--shell") {
-      shell = true;
+      args->shell = true;
     } else if (arg == "--keep" && has_value) {
-      options.keep_dir = argv[++first];
+      args->setup.keep_dir = argv[++first];
     } else if (arg == "--root" && has_value) {
-      options.root = argv[++first];
+      args->setup.root = argv[++first];
     } else if (arg == "--visible" && has_value) {
-      options.visible.push_back(argv[++first]);
+      args->setup.visible.push_back(argv[++first]);
     } else if (arg == "--") {
       ++first;
       break;
     } else {
-      return Usage();
+      return false;
     }
   }
-  std::vector<char*> command(argv + first, argv + argc);
-  if ((command.empty() && !shell) || options.root.empty()) {
-    return Usage();
+  args->command.assign(argv + first, argv + argc);
+  if ((args->command.empty() && !args->shell) || args->setup.root.empty()) return false;
+  // The command's own directory stays visible too (a program under /tmp).
+  char path[PATH_MAX];
+  if (!args->command.empty() && std::strchr(args->command[0], '/') != nullptr &&
+      ::realpath(args->command[0], path) != nullptr) {
+    std::string resolved = path;
+    args->setup.visible.push_back(resolved.substr(0, resolved.rfind('/')));
   }
-  char command_path[PATH_MAX];
-  if (!command.empty() && std::strchr(command[0], '/') != nullptr &&
-      ::realpath(command[0], command_path) != nullptr) {
-    options.visible.push_back(std::string(command_path).substr(
-        0, std::string(command_path).rfind('/')));
-  }
+  return true;
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  Arguments args;
+  if (!ParseArguments(argc, argv, &args)) return Usage();
   if (::getpid() != 1) {
     std::fprintf(stderr, "sandbox-init: must run as PID 1 of a new PID namespace\n");
     return 125;
   }
-  if (!tavow3::sandbox::SetUpAppliance(options)) return 125;
+  if (!tavow3::sandbox::SetUpAppliance(args.setup)) return 125;
   if (::mkdir(kLogDir, 0755) != 0 && errno != EEXIST) {
     std::fprintf(stderr, "sandbox-init: mkdir %s: %s\n", kLogDir, std::strerror(errno));
     return 125;
@@ -146,12 +156,12 @@ int main(int argc, char** argv) {
   InstallForwarding();
 
   int status = 0;
-  if (!command.empty()) status = RunAndReap(command, sink);
-  if (shell) {
+  if (!args.command.empty()) status = RunAndReap(args.command, sink);
+  if (args.shell) {
     char bash[] = "/bin/bash";
     char interactive[] = "-i";
     int shell_status = RunAndReap({bash, interactive}, sink);
-    if (command.empty()) status = shell_status;
+    if (args.command.empty()) status = shell_status;
   }
   KillTheRest();
   return status;

@@ -3,6 +3,7 @@
 #include <errno.h>
 #include <fcntl.h>
 #include <signal.h>
+#include <sys/prctl.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/un.h>
@@ -95,6 +96,7 @@ pid_t StartSyslogSink(const std::string& socket_path, const std::string& log_pat
   }
   pid_t pid = ::fork();
   if (pid == 0) {
+    (void)::prctl(PR_SET_NAME, "tavow3-syslog");  // tells it from PID 1 in ps
     ::signal(SIGINT, SIG_IGN);
     ::signal(SIGTERM, SIG_IGN);
     ::signal(SIGHUP, SIG_IGN);

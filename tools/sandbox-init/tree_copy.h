@@ -9,8 +9,8 @@ namespace tavow3::sandbox {
 // Copies the entries of the directory open as `source_fd` into `dest` (an
 // existing directory that keeps its own owner and mode), like "cp -a SOURCE/.
 // DEST" without hard links: directories are merged, files and symbolic links
-// replace what is there, owner, mode and times are kept. Returns false with a message on stderr at the
-// first entry that cannot be copied (devices, sockets and FIFOs cannot).
+// replace what is there, owner, mode and times are kept. Returns false with a message on stderr at
+// the first entry that cannot be copied (devices, sockets and FIFOs cannot).
 bool CopyTree(int source_fd, const std::string& dest);
 
 }  // namespace tavow3::sandbox
