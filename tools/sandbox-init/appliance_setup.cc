@@ -141,6 +141,8 @@ bool ReplaceDev(const std::string& dev, const std::string& shm) {
          Symlink("/proc/self/fd/2", dev + "/stderr") && Mount(dev, "/dev", nullptr, MS_MOVE);
 }
 
+// redirect_dir lets a directory of the lower layer be renamed, as on a plain
+// file system (the web-server deployers move such directories to backups).
 bool MountOverlays(const std::string& scratch) {
   for (const char* dir : kOverlaid) {
     std::string layer = scratch + "/" + dir;
@@ -148,7 +150,7 @@ bool MountOverlays(const std::string& scratch) {
         !MakeDir(layer + "/work", 0755) ||
         !Mount(std::string("tavow3-") + dir, std::string("/") + dir, "overlay", 0,
                "lowerdir=/" + std::string(dir) + ",upperdir=" + layer + "/upper,workdir=" + layer +
-                   "/work")) {
+                   "/work,redirect_dir=on")) {
       return false;
     }
   }
