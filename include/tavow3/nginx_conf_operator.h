@@ -2,6 +2,7 @@
 #ifndef TAVOW3_NGINX_CONF_OPERATOR_H_
 #define TAVOW3_NGINX_CONF_OPERATOR_H_
 
+#include <cstdint>
 #include <string>
 #include <vector>
 
@@ -10,8 +11,9 @@
 namespace tavow3 {
 
 // Operation numbers. The values are fixed: service scripts and the C
-// interface pass them as plain integers.
-enum NGINXCONF_OPERATOR {
+// interface pass them as plain integers. Any other int32 value may be passed
+// in; the manager refuses it.
+enum NGINXCONF_OPERATOR : int32_t {
   NGINXCONF_DEPLOY_INIT = 0,
   NGINXCONF_DEPLOY_HUP = 1,
   NGINXCONF_GEN_W3_CONF = 2,

@@ -18,5 +18,9 @@
 #include <tavow3/gen_w3_conf.h>
 #include <tavow3/nginx_conf_deployer.h>
 #include <tavow3/nginx_conf_policy.h>
+#include <tavow3/nginx_conf_operator.h>
+#include <tavow3/nginx_conf_operators.h>
+#include <tavow3/vantoro_proxy_operators.h>
+#include <tavow3/nginx_conf_manager.h>
 
 #endif  // TAVOW3_TAVOW3_H_
