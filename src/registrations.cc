@@ -1,6 +1,8 @@
 // The engine's built-in registration lists. They name the settings classes,
 // so they live here, above every subsystem, and the engine never includes a
 // settings header.
+#include <tavow3/wwwservice.h>
+
 #include "engine/engine_private.h"
 #include "engine/engine_v2_private.h"
 
@@ -8,17 +10,21 @@ namespace tavow3 {
 
 // The ResourceRegister callbacks of ZAM, AppPortal, ReverseProxy and
 // WWWService, in that order. A class takes its place in this order when it
-// joins the library; while none has, the list is empty.
+// joins the library.
 const std::vector<EngineCallback>& BuiltinCallbacks() {
-  static const std::vector<EngineCallback> callbacks;
+  static const std::vector<EngineCallback> callbacks = {
+      &WWWService::ResourceRegister,
+  };
   return callbacks;
 }
 
 // The ResourceRegisterV2 callbacks of ZAM, AppPortal, ReverseProxy and
 // WWWService, in that order. A class takes its place in this order when it
-// joins the library; while none has, the list is empty.
+// joins the library.
 const std::vector<EngineV2Callback>& BuiltinV2Callbacks() {
-  static const std::vector<EngineV2Callback> callbacks;
+  static const std::vector<EngineV2Callback> callbacks = {
+      &WWWService::ResourceRegisterV2,
+  };
   return callbacks;
 }
 

@@ -7,6 +7,8 @@
 #include <tavow3/resource.h>
 #include <tavow3/engine_v2.h>
 #include <tavow3/engine_c.h>
+#include <tavow3/w3base.h>
+#include <tavow3/wwwservice.h>
 #include <tavow3/port_validator.h>
 #include <tavow3/tls_registration.h>
 #include <tavow3/validator.h>
