@@ -29,11 +29,6 @@ std::string ReadRaw(const std::string& path) {
   return content.str();
 }
 
-bool PathExists(const std::string& path) {
-  struct stat st;
-  return ::lstat(path.c_str(), &st) == 0;
-}
-
 std::vector<std::string> DirNames(const std::string& dir) {
   std::vector<std::string> names;
   DIR* d = ::opendir(dir.c_str());

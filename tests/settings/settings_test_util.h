@@ -13,7 +13,6 @@ namespace tavow3::test {
 void WriteRaw(const std::string& path, const std::string& bytes);
 // The file's bytes, or "<missing>".
 std::string ReadRaw(const std::string& path);
-bool PathExists(const std::string& path);
 // Names in `dir`, sorted; empty when it is missing.
 std::vector<std::string> DirNames(const std::string& dir);
 // Runs argv and asserts it exits 0 (mount, mkdir and the like).

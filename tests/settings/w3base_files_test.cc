@@ -7,6 +7,7 @@
 
 #include "base/child_process.h"
 #include "base/fault.h"
+#include "manager/manager_test_util.h"
 #include "settings/settings_test_util.h"
 #include "support/syslog_capture.h"
 

@@ -6,6 +6,7 @@
 #include <tavow3/wwwservice.h>
 
 #include "engine/engine_private.h"
+#include "manager/manager_test_util.h"
 #include "settings/settings_test_util.h"
 #include "support/syslog_capture.h"
 
@@ -108,12 +109,14 @@ TEST(WWWService, WritingRules) {
   }
 }
 
+// The engine's load cycle registers what the stored file holds.
 TEST(WWWService, RegistersTheStoredAdditionalPorts) {
   WriteRaw(kStored, "{\"additionalPort\": {\"http\": 8081, \"https\": 8444}, \"ssl\": {}}");
   Engine engine;
-  WWWService::ResourceRegister(engine);
+  engine.load();
   const auto& resources = engine.impl().fqdn_resources;
-  ASSERT_EQ(2u, resources.size());
+  ASSERT_EQ(1u, resources.count({"", 8081}));
+  ASSERT_EQ(1u, resources.count({"", 8444}));
   const FQDNPortSchemaResource& http = resources.at({"", 8081});
   const FQDNPortSchemaResource& https = resources.at({"", 8444});
   EXPECT_EQ(FQDNPortSchemaResource::HTTP, http.schema);
@@ -132,8 +135,11 @@ TEST(WWWService, RegistersTheStoredAdditionalPorts) {
 
   MustRun({"/bin/rm", "-f", kStored});
   Engine empty;
-  WWWService::ResourceRegister(empty);
-  EXPECT_TRUE(empty.impl().fqdn_resources.empty());
+  empty.load();
+  for (const auto& entry : empty.impl().fqdn_resources) {
+    EXPECT_NE("http_extra", entry.second.section) << entry.second.port;
+    EXPECT_NE("https_extra", entry.second.section) << entry.second.port;
+  }
 }
 
 // A generator whose configuration nginx rejects: the save fails and leaves the
