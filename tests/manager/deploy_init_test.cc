@@ -31,8 +31,6 @@ bool GenerationLockIsFree() {
   return free;
 }
 
-void BreakFirewallFile() { WriteFileAt("/usr/tavo/etc/services.d/tavow3.sc/keep", ""); }
-void BreakCertificates() { WriteFileAt("/usr/tavo/etc/tls/services.json", "not json"); }
 void BreakFragment() {
   WriteFileAt("/usr/local/etc/nginx/conf.d/broken.conf", "bogus_directive on;\n");
 }

@@ -22,8 +22,6 @@ namespace fault = base::fault;
 
 constexpr char kFirewallFailed[] = "Cannot update tavow3.sc, port or section conflict occur\n";
 
-void BreakFirewallFile() { WriteFileAt("/usr/tavo/etc/services.d/tavow3.sc/keep", ""); }
-void BreakCertificates() { WriteFileAt("/usr/tavo/etc/tls/services.json", "not json"); }
 // A generator that writes a main configuration nginx refuses.
 void BreakGenerator() {
   WriteFileAt(kGeneratorScript,

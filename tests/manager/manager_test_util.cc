@@ -162,6 +162,13 @@ std::vector<std::string> DeployLog(int priority) {
   return OnlyDeployLines(LogMessages(priority));
 }
 
+void BreakFirewallFile() {
+  RemoveTree("/usr/tavo/etc/services.d/tavow3.sc");
+  WriteFileAt("/usr/tavo/etc/services.d/tavow3.sc/keep", "");
+}
+
+void BreakCertificates() { WriteFileAt("/usr/tavo/etc/tls/services.json", "not json"); }
+
 void PretendNginxRuns() { WriteFileAt("/run/nginx.pid", std::to_string(::getpid()) + "\n"); }
 
 bool WaitUntil(const std::function<bool()>& done, std::chrono::milliseconds timeout) {

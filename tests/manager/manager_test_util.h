@@ -55,6 +55,11 @@ std::vector<std::string> DeployLog();
 // The same at one syslog priority.
 std::vector<std::string> DeployLog(int priority);
 
+// Makes the firewall service file "tavow3.sc" impossible to replace or
+// delete (a directory stands there), so its regeneration fails.
+void BreakFirewallFile();
+// Makes the TLS-profile store unreadable, so the certificate synchronisation fails.
+void BreakCertificates();
 // Makes the nginx job look running: /run/nginx.pid names this process.
 void PretendNginxRuns();
 

@@ -154,7 +154,7 @@ TEST(NginxService, BootWithABrokenFragmentServesTheManagementPortsInDefault) {
 TEST(NginxService, BootWithoutGenerationServesTheManagementPorts) {
   // The firewall files fail: nothing is generated and nothing installed, and
   // the installed configuration is the package's, not the appliance's.
-  WriteFileAt("/usr/tavo/etc/services.d/tavow3.sc/keep", "");
+  BreakFirewallFile();
   const RunResult run = Service("start");
   ASSERT_EQ(0, run.status) << run.out << run.err;
   EXPECT_EQ("Firewall is not ok, change to default mode\n"

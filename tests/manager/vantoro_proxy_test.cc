@@ -5,7 +5,6 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <regex>
 #include <string>
 #include <vector>
 
@@ -48,6 +47,25 @@ std::string ListFile(const Lines& addresses) {
   std::string text;
   for (const std::string& address : addresses) text += "set_real_ip_from " + address + ";\n";
   return text;
+}
+
+// `line` with the six random characters of a temporary's name replaced by
+// "TEMP" and, when `expected` names no line ("nginx_deploy:N "), with the
+// line number replaced by "N"; GCC's regex breaks the sanitizer build.
+std::string Normalised(std::string line, const std::string& expected) {
+  const std::string stem = "/vantoro.conf.";
+  for (size_t at = line.find(stem); at != std::string::npos; at = line.find(stem, at + 1)) {
+    const size_t start = at + stem.size();
+    if (line.compare(start, 6, "XXXXXX") != 0 && line.size() >= start + 6) {
+      line.replace(start, 6, "TEMP");
+    }
+  }
+  const std::string tag = "nginx_deploy:";
+  if (expected.rfind(tag + "N ", 0) == 0 && line.rfind(tag, 0) == 0) {
+    const size_t digits_end = line.find(' ', tag.size());
+    line.replace(tag.size(), digits_end - tag.size(), "N");
+  }
+  return line;
 }
 
 TEST(NginxConfOperatorSetVantoroProxy, WritesOneLinePerAddressRootOwnedAndNginxReadsIt) {
@@ -187,25 +205,27 @@ struct FaultCase {
   fault::Op op;
   int nth;      // the nth call of that operation fails
   int result;
-  const char* log;  // regular expression of the one line, "" for none
+  std::string log;  // the one line (Normalised), "" for none
 };
 
 TEST(NginxConfOperatorSetVantoroProxy, FailureAtEachFileCallIsLoggedAndLeavesNoTemporary) {
-  const std::string temp = R"(/var/tmp/nginx/trusted_proxy/vantoro\.conf\.\w{6})";
-  const std::string list = R"(/var/tmp/nginx/trusted_proxy/vantoro\.conf)";
+  const std::string temp = "/var/tmp/nginx/trusted_proxy/vantoro.conf.TEMP";
+  const std::string io = ", Input/output error";
   const std::vector<FaultCase> cases = {
       {fault::Op::kMkstemp, 1, -1,
-       R"(nginx_deploy:1088 Fail to create temp file \(/var/tmp/nginx/trusted_proxy/vantoro\.conf\.XXXXXX, Input/output error\))"},
-      {fault::Op::kOpen, 1, -1, "nginx_deploy:1093 Fail to fopen file \\(T, Input/output error\\)"},
-      {fault::Op::kWrite, 1, -1, "nginx_deploy:\\d+ Fail to write file \\(T, Input/output error\\)"},
-      {fault::Op::kFsync, 1, -1, "nginx_deploy:\\d+ Fail to write file \\(T, Input/output error\\)"},
-      {fault::Op::kChown, 1, -1, "nginx_deploy:1101 Fail to chown file \\(T, Input/output error\\)"},
-      {fault::Op::kChmod, 1, -1, "nginx_deploy:1106 Fail to chmod file \\(T, Input/output error\\)"},
+       "nginx_deploy:1088 Fail to create temp file "
+       "(/var/tmp/nginx/trusted_proxy/vantoro.conf.XXXXXX" + io + ")"},
+      {fault::Op::kOpen, 1, -1, "nginx_deploy:1093 Fail to fopen file (" + temp + io + ")"},
+      {fault::Op::kWrite, 1, -1, "nginx_deploy:N Fail to write file (" + temp + io + ")"},
+      {fault::Op::kFsync, 1, -1, "nginx_deploy:N Fail to write file (" + temp + io + ")"},
+      {fault::Op::kChown, 1, -1, "nginx_deploy:1101 Fail to chown file (" + temp + io + ")"},
+      {fault::Op::kChmod, 1, -1, "nginx_deploy:1106 Fail to chmod file (" + temp + io + ")"},
       {fault::Op::kClose, 1, 0, ""},  // the descriptor of mkstemp, unused
-      {fault::Op::kClose, 2, -1, "nginx_deploy:\\d+ Fail to write file \\(T, Input/output error\\)"},
+      {fault::Op::kClose, 2, -1, "nginx_deploy:N Fail to write file (" + temp + io + ")"},
       {fault::Op::kRename, 1, -1,
-       "nginx_deploy:1111 Fail to rename file from T to L, Input/output error"},
-      {fault::Op::kUnlink, 1, 0, "nginx_deploy:1120 Fail to remove temp file T, Input/output error"},
+       "nginx_deploy:1111 Fail to rename file from " + temp +
+           " to /var/tmp/nginx/trusted_proxy/vantoro.conf" + io},
+      {fault::Op::kUnlink, 1, 0, "nginx_deploy:1120 Fail to remove temp file " + temp + io},
   };
   for (const FaultCase& c : cases) {
     SCOPED_TRACE(testing::Message() << "op " << static_cast<int>(c.op) << ", call " << c.nth);
@@ -221,15 +241,9 @@ TEST(NginxConfOperatorSetVantoroProxy, FailureAtEachFileCallIsLoggedAndLeavesNoT
     EXPECT_EQ(c.result == 0 ? kSetLine : "", set.msg);
     EXPECT_EQ(c.result == 0 ? "set_real_ip_from 192.0.2.1;\n" : kOldList, FileBytes(kList));
     EXPECT_EQ(Lines{"vantoro.conf"}, ListDir(kDir));
-    const Lines log = DeployLog();
-    if (*c.log == '\0') {
-      EXPECT_TRUE(log.empty());
-      continue;
-    }
-    ASSERT_EQ(1u, log.size());
-    std::string pattern = std::regex_replace(c.log, std::regex("T"), temp);
-    pattern = std::regex_replace(pattern, std::regex(" L,"), " " + list + ",");
-    EXPECT_TRUE(std::regex_match(log[0], std::regex(pattern))) << log[0] << "\n" << pattern;
+    Lines log = DeployLog();
+    for (std::string& line : log) line = Normalised(line, c.log);
+    EXPECT_EQ(c.log.empty() ? Lines{} : Lines{c.log}, log);
   }
 }
 
@@ -336,12 +350,11 @@ TEST(NginxConfOperatorListVantoroProxy, UnreadableFileIsLogged) {
   const Outcome list = RunPlain(NGINXCONF_LIST_VANTORO_PROXY);
   EXPECT_EQ(-1, list.result);
   EXPECT_EQ("", list.msg);
-  const Lines log = DeployLog();
-  ASSERT_EQ(1u, log.size());
-  EXPECT_TRUE(std::regex_match(
-      log[0], std::regex("nginx_deploy:\\d+ Failed to read "
-                         "/var/tmp/nginx/trusted_proxy/vantoro.conf Is a directory")))
-      << log[0];
+  const std::string expected =
+      "nginx_deploy:N Failed to read /var/tmp/nginx/trusted_proxy/vantoro.conf Is a directory";
+  Lines log = DeployLog();
+  for (std::string& line : log) line = Normalised(line, expected);
+  EXPECT_EQ(Lines{expected}, log);
 }
 
 }  // namespace
