@@ -42,23 +42,17 @@ Json::Value ServicesBySubscriber(const EngineV2::Security& security) {
   return by_subscriber;
 }
 
-// Writes the subscriber's certificate document and runs the registration tool.
+// Writes the subscriber's certificate document and runs the registration
+// tool. The tool's exit status decides: a document that cannot be written
+// does not keep the tool from running, which reports for itself what it lacks.
 bool RegisterSubscriber(const std::string& subscriber, const Json::Value& services,
                         bool is_package) {
-  // The name becomes a file name; one with a slash could leave the directory.
-  if (subscriber.empty() || subscriber.find('/') != std::string::npos) {
-    TAVOW3_LOG_ERR("Invalid certificate subscriber name \"%s\"", subscriber.c_str());
-    return false;
-  }
   Json::Value document(Json::objectValue);
   document["owner"] = "root";
   document["services"] = services;
   document["isPkg"] = is_package;
   const std::string path = std::string(kCertificateDir) + "/" + subscriber + ".cfg";
-  if (!base::ReplaceFile(path, StyledJson(document), kDocumentMode)) {
-    TAVOW3_LOG_ERR("Fail to write %s: %m", path.c_str());
-    return false;
-  }
+  (void)base::ReplaceFile(path, StyledJson(document), kDocumentMode);
   if (TLIBCExec(kRegisterTool, subscriber.c_str()) != 0) {
     TAVOW3_LOG_ERR_AT(92, "Faid to register certificate for subscriber %s", subscriber.c_str());
     return false;
@@ -85,10 +79,9 @@ Json::Value TlsServiceDocument(const EngineV2::Security& security) {
 
 bool SyncCertificates(const EngineV2::Security& security) {
   const Json::Value by_subscriber = ServicesBySubscriber(security);
-  if (!by_subscriber.empty() && TAVOFSMkdirP(kCertificateDir, 0, 0755) != 0) {
-    TAVOW3_LOG_ERR("make directory %s failed: %m", kCertificateDir);
-    return false;
-  }
+  // The directory belongs to the certificate service; made here only so that
+  // a fresh appliance can take the documents.
+  if (!by_subscriber.empty()) (void)TAVOFSMkdirP(kCertificateDir, 0, 0755);
   bool all_registered = true;
   for (const std::string& subscriber : by_subscriber.getMemberNames()) {
     const bool is_package = security.package_subscribers.count(subscriber) != 0;

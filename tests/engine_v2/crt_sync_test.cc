@@ -1,5 +1,7 @@
 // W3SyncCrtInfo: certificate documents, registration runs and the TLS store.
+#include <sys/stat.h>
 #include <syslog.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <set>
@@ -108,15 +110,31 @@ TEST(W3SyncCrtInfo, TlsDocumentNamesEveryService) {
             TlsServiceDocument(EngineWith({}).security()));
 }
 
+// Replaces the registration tool by one that appends its subscriber to
+// /run/crt-runs and fails for the subscriber `failing` only.
+void InstallToolFailingFor(const std::string& failing) {
+  const std::string tool = "/usr/tavo/bin/tavocrtregister";
+  ASSERT_EQ(0, ::unlink(tool.c_str()));
+  WriteBytes(tool, "#!/bin/sh\necho \"$1\" >> /run/crt-runs\ntest \"$1\" != \"" + failing +
+                       "\"\n");
+  ASSERT_EQ(0, ::chmod(tool.c_str(), 0755));
+}
+
 TEST(W3SyncCrtInfo, OneFailedRegistrationSkipsTheFramework) {
   const std::set<std::string> tls_before = TlsServices();
-  EngineV2 engine = EngineWith({{"alpha", "a", "A", ""}, {"bad/name", "b", "B", ""},
+  InstallToolFailingFor("beta");
+  ClearLog();
+  EngineV2 engine = EngineWith({{"alpha", "a", "A", ""}, {"beta", "b", "B", ""},
                                 {"gamma", "c", "C", ""}});
   EXPECT_FALSE(engine.W3SyncCrtInfo());
-  EXPECT_EQ((Calls{{"alpha"}, {"gamma"}}), FakeCalls("tavocrtregister"));
+  EXPECT_EQ("alpha\nbeta\ngamma\n", ReadBytes("/run/crt-runs"));
+  EXPECT_EQ(std::vector<std::string>{"engine_v2:92 Faid to register certificate for subscriber beta"},
+            LogMessages(LOG_ERR));
   EXPECT_EQ(tls_before, TlsServices());
+}
 
-  ClearFakeCalls("tavocrtregister");
+TEST(W3SyncCrtInfo, EveryFailedRegistrationIsLogged) {
+  const std::set<std::string> tls_before = TlsServices();
   SetFakeExit("tavocrtregister", 1);
   ClearLog();
   EngineV2 failing = EngineWith({{"alpha", "a", "A", ""}, {"gamma", "c", "C", ""}});
@@ -126,6 +144,38 @@ TEST(W3SyncCrtInfo, OneFailedRegistrationSkipsTheFramework) {
                                       "engine_v2:92 Faid to register certificate for subscriber gamma"}),
             LogMessages(LOG_ERR));
   EXPECT_EQ(tls_before, TlsServices());
+}
+
+// The tool's exit status alone decides: a document that cannot be written is
+// neither logged nor a reason to skip the tool, whatever the subscriber's name.
+TEST(W3SyncCrtInfo, UnwritableDocumentStillRunsTheTool) {
+  const struct {
+    const char* name;
+    std::vector<CrtResource> resources;
+    bool read_only;
+    Calls calls;
+  } cases[] = {
+      {"read-only directory", {{"alpha", "a", "A", ""}}, true, {{"alpha"}}},
+      {"name that is no file name", {{"bad/name", "b", "B", ""}}, false, {{"bad/name"}}},
+  };
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.name);
+    ClearFakeCalls("tavocrtregister");
+    if (c.read_only) {
+      ASSERT_TRUE(BindReadOnly(kCertificateDir));
+    }
+    const std::vector<std::string> before = Names(kCertificateDir);
+    ClearLog();
+    EngineV2 engine = EngineWith(c.resources);
+    EXPECT_TRUE(engine.W3SyncCrtInfo());
+    EXPECT_EQ(c.calls, FakeCalls("tavocrtregister"));
+    EXPECT_EQ(std::vector<std::string>{}, LogMessages(LOG_ERR));
+    EXPECT_EQ(before, Names(kCertificateDir));
+    const Json::Value tls = tavotls::DataStoreProvider::list_services();
+    for (const CrtResource& resource : c.resources) {
+      EXPECT_TRUE(tls.isMember(resource.subscriber + "_" + resource.service)) << resource.subscriber;
+    }
+  }
 }
 
 TEST(W3SyncCrtInfo, FrameworkFailureDecides) {
