@@ -29,7 +29,7 @@ namespace tavow3 {
 // Replaces "/usr/tavo/share/certificate.d/<subscriber>.cfg" with a document
 // naming this one service, then runs "/usr/tavo/bin/tavocrtregister subscriber
 // service". True when the tool exits with 0; a file that cannot be written does
-// not stop the tool. A subscriber that is empty or holds "/" is refused (false).
+// not stop the tool.
 [[nodiscard]] TAVOW3_EXPORT bool RegisterCertificate(const std::string& subscriber,
                                                      const std::string& service,
                                                      const std::string& display_name,

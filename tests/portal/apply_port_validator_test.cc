@@ -22,6 +22,14 @@ FQDNPortSchemaResource PortalResource(const std::string& fqdn, Schema schema) {
                                 "app:desc", /*protocol=*/0, "tavow3");
 }
 
+// An engine marked as loaded: no settings object's registration joins in, so
+// the registry holds exactly what a test registers.
+Engine LoadedEngine() {
+  Engine engine;
+  engine.impl().load_state = 2;
+  return engine;
+}
+
 // The (host name, port) keys the engine holds now.
 std::set<std::pair<std::string, unsigned short>> Registered(Engine& engine) {
   std::set<std::pair<std::string, unsigned short>> keys;
@@ -30,7 +38,7 @@ std::set<std::pair<std::string, unsigned short>> Registered(Engine& engine) {
 }
 
 TEST(ApplyPortValidator, MovesTheRegistrationToTheNewPort) {
-  Engine engine;
+  Engine engine = LoadedEngine();
   unsigned short port = 0;
   ASSERT_EQ(PortChange::kChanged,
             ApplyPortValidator(engine, PortValidator(8080), PortalResource("", Schema::HTTP), &port));
@@ -49,7 +57,7 @@ TEST(ApplyPortValidator, MovesTheRegistrationToTheNewPort) {
 }
 
 TEST(ApplyPortValidator, SamePortAndZeroTouchNothing) {
-  Engine engine;
+  Engine engine = LoadedEngine();
   unsigned short port = 8080;
   EXPECT_EQ(PortChange::kUnchanged,
             ApplyPortValidator(engine, PortValidator(8080), PortalResource("", Schema::HTTP), &port));
@@ -60,7 +68,7 @@ TEST(ApplyPortValidator, SamePortAndZeroTouchNothing) {
 }
 
 TEST(ApplyPortValidator, RefusalKeepsTheOldPortRegistered) {
-  Engine engine;
+  Engine engine = LoadedEngine();
   unsigned short port = 0;
   ASSERT_EQ(PortChange::kChanged,
             ApplyPortValidator(engine, PortValidator(8080), PortalResource("", Schema::HTTP), &port));
@@ -85,7 +93,7 @@ TEST(ApplyPortValidator, PortInUseByAProcessIsRefused) {
   ASSERT_EQ(0, ::bind(listener, reinterpret_cast<sockaddr*>(&address), sizeof address));
   ASSERT_EQ(0, ::listen(listener, 1));
 
-  Engine engine;
+  Engine engine = LoadedEngine();
   unsigned short port = 8080;
   EXPECT_EQ(PortChange::kRefused,
             ApplyPortValidator(engine, PortValidator(9191), PortalResource("", Schema::HTTP), &port));
@@ -96,7 +104,7 @@ TEST(ApplyPortValidator, PortInUseByAProcessIsRefused) {
 
 // The old resource is dropped under the resource's host name.
 TEST(ApplyPortValidator, HostNamedResourceMovesToo) {
-  Engine engine;
+  Engine engine = LoadedEngine();
   unsigned short port = 0;
   const FQDNPortSchemaResource resource = PortalResource("photo.example", Schema::HTTPS);
   ASSERT_EQ(PortChange::kChanged, ApplyPortValidator(engine, PortValidator(8443), resource, &port));
