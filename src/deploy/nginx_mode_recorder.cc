@@ -4,6 +4,7 @@
 #include <fcntl.h>
 #include <sys/mman.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <cstdio>
 #include <cstdlib>
@@ -25,18 +26,22 @@ constexpr char kShmName[] = "nginx_mod";
 constexpr size_t kRecordSize = 4096;
 constexpr mode_t kRecordMode = 0644;
 
-// An object shorter than the record (another process is between creating and
-// sizing it) would fault on access. Checked through the descriptor's /proc
+// Reading a page of the mapping that lies wholly past the object's end raises
+// SIGBUS: an empty object (another process is between creating and sizing it)
+// must not be read. Bytes past the end within the object's last page read as
+// zero, as the record's padding does. Checked through the descriptor's /proc
 // link, which names the very object; without /proc the check is skipped.
-bool IsShorterThanRecord(int fd) {
+bool WouldFaultOnRead(int fd) {
   struct stat st;
-  return base::Stat("/proc/self/fd/" + std::to_string(fd), &st) &&
-         st.st_size < static_cast<off_t>(kRecordSize);
+  if (!base::Stat("/proc/self/fd/" + std::to_string(fd), &st)) return false;
+  const off_t page = ::sysconf(_SC_PAGESIZE);
+  const off_t backed = (st.st_size + page - 1) / page * page;
+  return backed < static_cast<off_t>(kRecordSize);
 }
 
 // Maps the record of `fd` and parses it: the mode, or -1.
 int ReadRecord(int fd) {
-  if (IsShorterThanRecord(fd)) return -1;
+  if (WouldFaultOnRead(fd)) return -1;
   base::Mapping mapping(fd, kRecordSize, PROT_READ, MAP_SHARED);
   if (!mapping) return -1;
   char text[kRecordSize];

@@ -97,12 +97,27 @@ TEST(NginxModeRecorder, RejectedRecordsReadAsMinusOne) {
   }
 }
 
-TEST(NginxModeRecorder, ObjectShorterThanARecordReadsAsMinusOne) {
-  // Another process between creating and sizing the object.
-  for (off_t size : {0, 100, 4095}) {
-    SCOPED_TRACE(size);
-    WriteFileAt(kShmFile, std::string(size, '\0'));
-    EXPECT_EQ(-1, NginxModeRecorder::GetMode());
+// An object shorter than a record reads as its bytes followed by zeros; an
+// empty one (another process between creating and sizing it) reads as no
+// record, without a log line and without a fault.
+TEST(NginxModeRecorder, ObjectShorterThanARecordReadsAsPadded) {
+  const struct {
+    std::string bytes;
+    int mode;
+    std::vector<std::string> log;
+  } cases[] = {
+      {"", -1, {}},
+      {std::string("1\0", 2), 1, {}},
+      {"2", 2, {}},
+      {std::string(100, '\0'), -1, {"nginx_deploy:650 Bad nginx mode record data"}},
+      {std::string(kRecordSize - 1, '\0'), -1, {"nginx_deploy:650 Bad nginx mode record data"}},
+  };
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.bytes.size());
+    WriteFileAt(kShmFile, c.bytes);
+    ClearLog();
+    EXPECT_EQ(c.mode, NginxModeRecorder::GetMode());
+    EXPECT_EQ(c.log, DeployLog());
   }
 }
 
