@@ -19,7 +19,7 @@ class TAVOW3_EXPORT GenNginxConf {
 
  private:
   Lock lock_;
-  bool locked_;
+  bool locked;
 };
 
 #endif  // TAVOW3_GEN_NGINX_CONF_H_

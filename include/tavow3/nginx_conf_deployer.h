@@ -35,7 +35,7 @@ class TAVOW3_EXPORT NginxConfDeployer {
   // Takes ownership of `strategy` (never null).
   explicit NginxConfDeployer(std::unique_ptr<NginxFwStrategy> strategy);
 
-  bool valid_ = false;  // set by the subclass when its file work succeeded
+  bool valid = false;  // set by the subclass when its file work succeeded
 
  private:
   std::string test_msg_;

@@ -8,11 +8,11 @@ constexpr char kGeneratorScript[] = "/usr/tavo/etc/rc.sysv/nginx-conf-generator.
 
 }  // namespace
 
-GenNginxConf::GenNginxConf() : locked_(lock_.lock()) {
+GenNginxConf::GenNginxConf() : locked(lock_.lock()) {
   // The script reports its problems through the test that follows.
-  if (locked_) (void)TLIBCExec(kGeneratorScript);
+  if (locked) (void)TLIBCExec(kGeneratorScript);
 }
 
 bool GenNginxConf::TestNginxTmpConf() {
-  return locked_ && TLIBCExec("/usr/bin/nginx", "-tc", "/var/tmp/nginx/nginx.conf") == 0;
+  return locked && TLIBCExec("/usr/bin/nginx", "-tc", "/var/tmp/nginx/nginx.conf") == 0;
 }

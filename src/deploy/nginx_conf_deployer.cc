@@ -45,7 +45,7 @@ NginxConfDeployer::NginxConfDeployer(std::unique_ptr<NginxFwStrategy> strategy)
 
 NginxConfDeployer::~NginxConfDeployer() = default;
 
-bool NginxConfDeployer::IsConfValid() { return valid_ && TestNginxConf(); }
+bool NginxConfDeployer::IsConfValid() { return valid && TestNginxConf(); }
 
 bool NginxConfDeployer::TestNginxConf() {
   test_msg_.clear();
@@ -64,7 +64,7 @@ bool NginxConfDeployer::ApplyFirewallStrategy() { return strategy_->ApplyFirewal
 
 DeployNginxConfNormal::DeployNginxConfNormal()
     : NginxConfDeployer(std::make_unique<FwStrategyClear>()) {
-  valid_ = InstallMainConf() && MakeLink(kConfDTarget, kConfDLink) &&
+  valid = InstallMainConf() && MakeLink(kConfDTarget, kConfDLink) &&
            MakeLink(kSitesTarget, kSitesLink) && MakeLink(kAppDTarget, kAppDLink);
 }
 
@@ -72,7 +72,7 @@ std::string DeployNginxConfNormal::GetNginxModeString() const { return "Normal";
 
 DeployNginxConfAbnormal::DeployNginxConfAbnormal()
     : NginxConfDeployer(std::make_unique<FwStrategyClear>()) {
-  valid_ = InstallMainConf() && RemoveIfExists(kConfDLink) && RemoveIfExists(kSitesLink) &&
+  valid = InstallMainConf() && RemoveIfExists(kConfDLink) && RemoveIfExists(kSitesLink) &&
            MakeLink(kAppDTarget, kAppDLink);
 }
 
@@ -80,9 +80,9 @@ std::string DeployNginxConfAbnormal::GetNginxModeString() const { return "Abnorm
 
 DeployNginxConfDefault::DeployNginxConfDefault()
     : NginxConfDeployer(std::make_unique<FwStrategyZAMDefault>()) {
-  valid_ = true;
+  valid = true;
 }
 
-bool DeployNginxConfDefault::IsConfValid() { return valid_; }
+bool DeployNginxConfDefault::IsConfValid() { return valid; }
 
 std::string DeployNginxConfDefault::GetNginxModeString() const { return "Default"; }
