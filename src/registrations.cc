@@ -2,6 +2,7 @@
 // so they live here, above every subsystem, and the engine never includes a
 // settings header.
 #include <tavow3/wwwservice.h>
+#include <tavow3/zam.h>
 
 #include "engine/engine_private.h"
 #include "engine/engine_v2_private.h"
@@ -13,6 +14,7 @@ namespace tavow3 {
 // joins the library.
 const std::vector<EngineCallback>& BuiltinCallbacks() {
   static const std::vector<EngineCallback> callbacks = {
+      &ZAM::ResourceRegister,
       &WWWService::ResourceRegister,
   };
   return callbacks;
@@ -23,6 +25,7 @@ const std::vector<EngineCallback>& BuiltinCallbacks() {
 // joins the library.
 const std::vector<EngineV2Callback>& BuiltinV2Callbacks() {
   static const std::vector<EngineV2Callback> callbacks = {
+      &ZAM::ResourceRegisterV2,
       &WWWService::ResourceRegisterV2,
   };
   return callbacks;

@@ -24,5 +24,6 @@
 #include <tavow3/nginx_conf_operators.h>
 #include <tavow3/vantoro_proxy_operators.h>
 #include <tavow3/nginx_conf_manager.h>
+#include <tavow3/zam.h>
 
 #endif  // TAVOW3_TAVOW3_H_
