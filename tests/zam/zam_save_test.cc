@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "manager/manager_test_util.h"
 #include "support/fake_tools.h"
 #include "support/syslog_capture.h"
 #include "zam/zam_test_util.h"

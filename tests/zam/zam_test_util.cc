@@ -2,7 +2,6 @@
 
 #include <gtest/gtest.h>
 #include <json/reader.h>
-#include <sys/stat.h>
 
 #include <algorithm>
 #include <fstream>
@@ -32,11 +31,6 @@ std::string ReadRaw(const std::string& path) {
   std::ostringstream content;
   content << in.rdbuf();
   return content.str();
-}
-
-bool PathExists(const std::string& path) {
-  struct stat st;
-  return ::lstat(path.c_str(), &st) == 0;
 }
 
 void MustRun(const std::vector<std::string>& argv) {

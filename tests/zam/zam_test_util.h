@@ -28,7 +28,6 @@ constexpr char kFirewallFile[] = "/usr/tavo/etc/services.d/tavow3.sc";
 void WriteRaw(const std::string& path, const std::string& bytes);
 // The file's bytes, or "<missing>".
 std::string ReadRaw(const std::string& path);
-bool PathExists(const std::string& path);
 // Runs argv and fails the test unless it exits 0.
 void MustRun(const std::vector<std::string>& argv);
 // Removes `path` when it exists.
