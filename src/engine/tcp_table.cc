@@ -15,7 +15,7 @@ constexpr size_t kMaxPiece = 1023;
 }  // namespace
 
 TcpTableReader::TcpTableReader(const std::string& path)
-    : fd_(base::Open(path, O_RDONLY)), buffer_(new char[kBufferSize]) {}
+    : fd_(base::Open(path, O_RDONLY)), buffer_(new char[kBufferSize + 1]) {}
 
 TcpTableReader::~TcpTableReader() = default;
 
@@ -37,7 +37,7 @@ bool TcpTableReader::Next(TcpTableLine* line) {
   if (!is_open()) return false;
   for (;;) {
     const size_t available = end_ - begin_;
-    const char* start = buffer_.get() + begin_;
+    char* const start = buffer_.get() + begin_;
     const size_t window = available < kMaxPiece ? available : kMaxPiece;
     const void* newline = std::memchr(start, '\n', window);
     size_t piece;
@@ -54,7 +54,14 @@ bool TcpTableReader::Next(TcpTableLine* line) {
       return false;
     }
     begin_ += piece;
-    if (ParseTcpTableLine(start, start + piece, line)) return true;
+    // The piece becomes a C string for the matcher: the byte after it (the
+    // next line's first, or the spare byte at the buffer's end) is put back.
+    char* const after = buffer_.get() + begin_;
+    const char saved = *after;
+    *after = '\0';
+    const bool parsed = ParseTcpTableLine(start, line);
+    *after = saved;
+    if (parsed) return true;
   }
 }
 

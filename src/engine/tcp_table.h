@@ -23,11 +23,11 @@ struct TcpTableLine {
   unsigned long long inode = 0;
 };
 
-// Parses the text [begin, end), which ends early at a NUL byte as a C string
-// would. Returns true and fills *line when sscanf(text, kTcpTableLineFormat,
-// ...) would return 3, with the same values (numbers wrap and saturate as
-// scanf's do); otherwise returns false and leaves *line unchanged.
-TAVOW3_INTERNAL bool ParseTcpTableLine(const char* begin, const char* end, TcpTableLine* line);
+// Parses the C string `text`. Returns true and fills *line when
+// sscanf(text, kTcpTableLineFormat, ...) would return 3, with the same values
+// (numbers wrap and saturate as scanf's do); otherwise returns false and
+// leaves *line unchanged.
+TAVOW3_INTERNAL bool ParseTcpTableLine(const char* text, TcpTableLine* line);
 
 // Reads one table file line by line as fgets with a 1024-byte buffer would:
 // pieces of at most 1023 bytes, each ending after a newline or where the
