@@ -55,7 +55,7 @@ class TAVOW3_INTERNAL TcpTableReader {
   void Fill();
 
   base::UniqueFd fd_;
-  std::unique_ptr<char[]> buffer_;
+  std::unique_ptr<char[]> buffer_;  // kBufferSize bytes and one spare for a NUL
   size_t begin_ = 0;  // first unread byte
   size_t end_ = 0;    // end of the bytes read
   bool at_eof_ = false;
