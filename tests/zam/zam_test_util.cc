@@ -1,11 +1,12 @@
 #include "zam/zam_test_util.h"
 
+#define PCRE2_CODE_UNIT_WIDTH 8
+
 #include <gtest/gtest.h>
 #include <json/reader.h>
+#include <pcre2.h>
 
-#include <algorithm>
 #include <fstream>
-#include <regex>
 #include <sstream>
 
 #include "base/child_process.h"
@@ -45,19 +46,38 @@ Json::Value ParseJson(const std::string& text) {
   return value;
 }
 
+namespace {
+
+// The messages of `messages` that `pattern` (PCRE2) matches entirely.
+std::vector<std::string> Matching(const std::vector<std::string>& messages,
+                                  const std::string& pattern) {
+  int error;
+  PCRE2_SIZE offset;
+  pcre2_code* re = pcre2_compile(reinterpret_cast<PCRE2_SPTR>(pattern.c_str()), pattern.size(),
+                                 PCRE2_ANCHORED | PCRE2_ENDANCHORED, &error, &offset, nullptr);
+  EXPECT_NE(nullptr, re) << "bad pattern " << pattern;
+  std::vector<std::string> matching;
+  if (re == nullptr) return matching;
+  pcre2_match_data* match = pcre2_match_data_create_from_pattern(re, nullptr);
+  for (const std::string& m : messages) {
+    if (pcre2_match(re, reinterpret_cast<PCRE2_SPTR>(m.data()), m.size(), 0, 0, match, nullptr) >=
+        0) {
+      matching.push_back(m);
+    }
+  }
+  pcre2_match_data_free(match);
+  pcre2_code_free(re);
+  return matching;
+}
+
+}  // namespace
+
 bool HasLogMatching(const std::vector<std::string>& messages, const std::string& pattern) {
-  const std::regex re(pattern);
-  return std::any_of(messages.begin(), messages.end(),
-                     [&](const std::string& m) { return std::regex_match(m, re); });
+  return !Matching(messages, pattern).empty();
 }
 
 std::vector<std::string> LogsMatching(const std::string& pattern) {
-  const std::regex re(pattern);
-  std::vector<std::string> matching;
-  for (const std::string& m : LogMessages()) {
-    if (std::regex_match(m, re)) matching.push_back(m);
-  }
-  return matching;
+  return Matching(LogMessages(), pattern);
 }
 
 void FakeProcessorCount(int count) {
