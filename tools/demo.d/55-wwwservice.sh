@@ -37,3 +37,7 @@ show tavow3-wwwservice set
 show curl -s --max-time 2 http://127.0.0.1:8082/
 show curl -s http://127.0.0.1:8081/
 show "$nginx_sh" stop
+
+echo
+echo "The administrator reverts the file; the next steps start from the defaults."
+rm -f "$stored"
