@@ -13,7 +13,8 @@
 
 #include "base/fault.h"
 #include "base/file_io.h"
-#include "test_util.h"
+#include "support/test_files.h"
+#include "support/test_process.h"
 
 namespace tavow3::base {
 namespace {
@@ -249,7 +250,7 @@ TEST(ChildProcess, FaultHookStopsBeforeAnyProcessStarts) {
     EXPECT_EQ(EAGAIN, errno);
     EXPECT_TRUE(arm.fired());
   }
-  EXPECT_TRUE(test::Names("/tmp/spawn").empty());
+  EXPECT_TRUE(test::DirNames("/tmp/spawn").empty());
   EXPECT_TRUE(NoChildren());
 
   // A child whose kill fails is left alone: waiting for it could block.

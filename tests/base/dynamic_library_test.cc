@@ -9,7 +9,7 @@
 #include <gtest/gtest.h>
 
 #include "base/fault.h"
-#include "test_util.h"
+#include "support/test_files.h"
 
 namespace tavow3::base {
 namespace {

@@ -17,7 +17,9 @@
 #include <gtest/gtest.h>
 
 #include "base/fault.h"
-#include "test_util.h"
+#include "support/test_files.h"
+#include "support/test_mounts.h"
+#include "support/test_process.h"
 
 namespace tavow3::base {
 namespace {
@@ -123,7 +125,7 @@ TEST(FileIo, ReadOnlyMountRefusesChanges) {
   }
   EXPECT_TRUE(temp.empty());
   EXPECT_EQ("bytes", ReadBytes("/tmp/fileio/file"));
-  EXPECT_EQ((std::vector<std::string>{"file", "sub"}), test::Names(kDir));
+  EXPECT_EQ((std::vector<std::string>{"file", "sub"}), test::DirNames(kDir));
 }
 
 // Every wrapper asks the hook before it touches the system.
@@ -173,7 +175,7 @@ TEST(FileIo, FaultHookFailsEachWrapperFirst) {
   EXPECT_EQ("kept", text);
   EXPECT_EQ(std::vector<std::string>{"kept"}, list);
   EXPECT_FALSE(read_end.valid());
-  EXPECT_EQ((std::vector<std::string>{"file", "link"}), test::Names(kDir));
+  EXPECT_EQ((std::vector<std::string>{"file", "link"}), test::DirNames(kDir));
   struct stat file_st;
   ASSERT_EQ(0, ::stat("/tmp/fileio/file", &file_st));
   EXPECT_EQ(0u, file_st.st_uid);

@@ -13,7 +13,8 @@
 #include "base/child_process.h"
 #include "base/fault.h"
 #include "base/file_io.h"
-#include "test_util.h"
+#include "support/test_files.h"
+#include "support/test_process.h"
 
 namespace tavow3::base {
 namespace {

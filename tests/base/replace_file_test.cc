@@ -8,13 +8,14 @@
 
 #include "base/fault.h"
 #include "base/file_io.h"
-#include "test_util.h"
+#include "support/test_files.h"
+#include "support/test_mounts.h"
 
 namespace tavow3::base {
 namespace {
 
 using test::FreshDir;
-using test::Names;
+using test::DirNames;
 using test::ReadBytes;
 using test::WriteBytes;
 
@@ -24,7 +25,7 @@ const FileMode kMode = {1, 1, 0644};
 
 // Removes what a persistent fault left behind (its unlink failed too).
 void KeepOnly(const std::string& dir, const std::string& name) {
-  for (const std::string& entry : Names(dir)) {
+  for (const std::string& entry : DirNames(dir)) {
     if (entry != name) std::remove((dir + "/" + entry).c_str());
   }
 }
@@ -55,7 +56,7 @@ TEST(ReplaceFile, FailureAtEveryFileCallKeepsOldBytes) {
       EXPECT_FALSE(ok);
       EXPECT_EQ("old", ReadBytes(kPath));
       if (mode == fault::kOnce) {
-        EXPECT_EQ(std::vector<std::string>{"settings.json"}, Names(kDir));
+        EXPECT_EQ(std::vector<std::string>{"settings.json"}, DirNames(kDir));
       }
       KeepOnly(kDir, "settings.json");
       ASSERT_LT(n, 50) << "the operation never completed";
@@ -88,7 +89,7 @@ TEST(ReplaceFile, WritesBytesOwnerAndMode) {
     EXPECT_EQ(c.mode.uid, st.st_uid);
     EXPECT_EQ(c.mode.gid, st.st_gid);
     EXPECT_EQ(c.mode.mode, st.st_mode & 07777);
-    EXPECT_EQ(std::vector<std::string>{"settings.json"}, Names(kDir));
+    EXPECT_EQ(std::vector<std::string>{"settings.json"}, DirNames(kDir));
   }
 }
 
@@ -104,7 +105,7 @@ TEST(ReplaceFile, FullFileSystemFailsBeforeRename) {
   EXPECT_FALSE(ReplaceFile(kPath, std::string(128 * 1024, 'n'), kMode));
   EXPECT_EQ(ENOSPC, errno);
   EXPECT_EQ(old_bytes, ReadBytes(kPath));
-  EXPECT_EQ(std::vector<std::string>{"settings.json"}, Names(kDir));
+  EXPECT_EQ(std::vector<std::string>{"settings.json"}, DirNames(kDir));
 
   // What fits still goes through on the same file system.
   EXPECT_TRUE(ReplaceFile(kPath, std::string(16 * 1024, 'n'), kMode)) << strerror(errno);
@@ -144,8 +145,8 @@ TEST(ReplaceFile, RenameOntoDirectoryRemovesTemporary) {
   errno = 0;
   EXPECT_FALSE(ReplaceFile(kPath, "new", kMode));
   EXPECT_EQ(EISDIR, errno);
-  EXPECT_EQ(std::vector<std::string>{"settings.json"}, Names(kDir));
-  EXPECT_TRUE(Names(kPath).empty());
+  EXPECT_EQ(std::vector<std::string>{"settings.json"}, DirNames(kDir));
+  EXPECT_TRUE(DirNames(kPath).empty());
 }
 
 }  // namespace

@@ -12,7 +12,8 @@
 
 #include "base/child_process.h"
 #include "base/fault.h"
-#include "test_util.h"
+#include "support/test_files.h"
+#include "support/test_process.h"
 
 namespace tavow3::base {
 namespace {
