@@ -12,14 +12,14 @@
 #include <thread>
 #include <vector>
 
-#include "test_util.h"
+#include "support/test_files.h"
 
 namespace {
 
-using platform_test::FreshDir;
-using platform_test::Lines;
-using platform_test::ReadBytes;
-using platform_test::WriteBytes;
+using tavow3::test::FreshDir;
+using tavow3::test::Lines;
+using tavow3::test::ReadBytes;
+using tavow3::test::WriteBytes;
 
 constexpr char kDir[] = "/tmp/exec";
 constexpr char kRecorder[] = "/tmp/exec/record";

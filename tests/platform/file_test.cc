@@ -8,13 +8,14 @@
 #include <cerrno>
 #include <string>
 
-#include "test_util.h"
+#include "support/test_files.h"
+#include "support/test_mounts.h"
 
 namespace {
 
-using platform_test::FreshDir;
-using platform_test::ReadBytes;
-using platform_test::WriteBytes;
+using tavow3::test::FreshDir;
+using tavow3::test::ReadBytes;
+using tavow3::test::WriteBytes;
 
 TEST(TLIBCFileExist, AnyObjectFollowingLinks) {
   FreshDir("/tmp/exist");
@@ -57,7 +58,7 @@ TEST(TLIBCFileTouch, Failures) {
   FreshDir("/tmp/touch");
   WriteBytes("/tmp/touch/file", "");
   FreshDir("/tmp/touch/ro");
-  ASSERT_TRUE(platform_test::BindReadOnly("/tmp/touch/ro"));
+  ASSERT_TRUE(tavow3::test::BindReadOnly("/tmp/touch/ro"));
   struct Case {
     const char* path;
     int error;

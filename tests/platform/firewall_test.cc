@@ -7,17 +7,13 @@
 #include <string>
 #include <vector>
 
-#include "test_util.h"
+#include "support/test_process.h"
 
 namespace {
 
-using platform_test::Lines;
-using platform_test::ShellOutput;
+using tavow3::test::IptablesRules;
 
 constexpr char kSet[] = "ZAM_DEFAULT_SERVICE";
-
-// The filter table's rules, as `iptables -S` prints them.
-std::vector<std::string> Rules() { return Lines(ShellOutput("/usr/bin/iptables -w -S")); }
 
 int Count(const std::vector<std::string>& rules, const std::string& rule) {
   return static_cast<int>(std::count(rules.begin(), rules.end(), rule));
@@ -30,7 +26,7 @@ void Iptables(const std::string& args) {
 
 class FirewallModules : public testing::Test {
  protected:
-  void SetUp() override { ASSERT_EQ(0, Count(Rules(), "-N ZAM_DEFAULT_FORWARD")); }
+  void SetUp() override { ASSERT_EQ(0, Count(IptablesRules(), "-N ZAM_DEFAULT_FORWARD")); }
   FW::TAVO_IPTABLES_MODULES modules_;
 };
 
@@ -40,7 +36,7 @@ TEST_F(FirewallModules, LoadCreatesChainAndFirstJumpOnce) {
   EXPECT_TRUE(modules_.iptablesCoreModLoad(kSet));
   EXPECT_TRUE(modules_.isModuleLoad(kSet));
   EXPECT_TRUE(modules_.iptablesCoreModLoad(kSet));
-  std::vector<std::string> rules = Rules();
+  std::vector<std::string> rules = IptablesRules();
   EXPECT_EQ(1, Count(rules, "-N ZAM_DEFAULT_FORWARD"));
   EXPECT_EQ(1, Count(rules, "-A INPUT -j ZAM_DEFAULT_FORWARD"));
   std::vector<std::string> input;
@@ -57,7 +53,7 @@ TEST_F(FirewallModules, LoadCompletesAHalfLoadedSet) {
   EXPECT_FALSE(modules_.isModuleLoad(kSet));  // chain without the jump
   EXPECT_TRUE(modules_.iptablesCoreModLoad(kSet));
   EXPECT_TRUE(modules_.isModuleLoad(kSet));
-  EXPECT_EQ(1, Count(Rules(), "-A ZAM_DEFAULT_FORWARD -p tcp -m tcp --dport 5000 -j ACCEPT"));
+  EXPECT_EQ(1, Count(IptablesRules(), "-A ZAM_DEFAULT_FORWARD -p tcp -m tcp --dport 5000 -j ACCEPT"));
 }
 
 TEST_F(FirewallModules, UnloadRemovesJumpsRulesAndChain) {
@@ -67,17 +63,17 @@ TEST_F(FirewallModules, UnloadRemovesJumpsRulesAndChain) {
       "-j ACCEPT");
   EXPECT_TRUE(modules_.iptablesCoreModUnload(kSet));
   EXPECT_FALSE(modules_.isModuleLoad(kSet));
-  std::vector<std::string> rules = Rules();
+  std::vector<std::string> rules = IptablesRules();
   for (const std::string& rule : rules) EXPECT_EQ(std::string::npos, rule.find("ZAM_DEFAULT"));
   EXPECT_TRUE(modules_.iptablesCoreModUnload(kSet));  // nothing loaded: still success
-  EXPECT_EQ(rules, Rules());
+  EXPECT_EQ(rules, IptablesRules());
 }
 
 TEST_F(FirewallModules, UnknownSetAndMissingIptablesFail) {
   EXPECT_FALSE(modules_.iptablesCoreModLoad("OTHER_SERVICE"));
   EXPECT_FALSE(modules_.iptablesCoreModUnload("OTHER_SERVICE"));
   EXPECT_FALSE(modules_.isModuleLoad("OTHER_SERVICE"));
-  EXPECT_EQ(0, Count(Rules(), "-N ZAM_DEFAULT_FORWARD"));
+  EXPECT_EQ(0, Count(IptablesRules(), "-N ZAM_DEFAULT_FORWARD"));
 
   ASSERT_TRUE(modules_.iptablesCoreModLoad(kSet));
   ASSERT_EQ(0, ::rename("/usr/bin/iptables", "/usr/bin/iptables.away"));

@@ -10,14 +10,14 @@
 #include <string>
 #include <vector>
 
-#include "test_util.h"
+#include "support/test_files.h"
 
 namespace {
 
-using platform_test::FreshDir;
-using platform_test::Lines;
-using platform_test::ReadBytes;
-using platform_test::WriteBytes;
+using tavow3::test::FreshDir;
+using tavow3::test::Lines;
+using tavow3::test::ReadBytes;
+using tavow3::test::WriteBytes;
 
 constexpr char kLog[] = "/tmp/hooks.log";
 

@@ -6,11 +6,11 @@
 #include <string>
 #include <vector>
 
-#include "test_util.h"
+#include "support/test_files.h"
 
 namespace {
 
-using platform_test::WriteBytes;
+using tavow3::test::WriteBytes;
 
 constexpr char kPath[] = "/tmp/test.sc";
 

@@ -8,14 +8,15 @@
 #include <string>
 #include <vector>
 
-#include "test_util.h"
+#include "support/test_files.h"
+#include "support/test_mounts.h"
 
 namespace {
 
-using platform_test::FreshDir;
-using platform_test::Names;
-using platform_test::ReadBytes;
-using platform_test::WriteBytes;
+using tavow3::test::DirNames;
+using tavow3::test::FreshDir;
+using tavow3::test::ReadBytes;
+using tavow3::test::WriteBytes;
 
 struct stat Stat(const std::string& path) {
   struct stat st = {};
@@ -64,7 +65,7 @@ TEST(TAVOFSMkdirP, Failures) {
   FreshDir("/var/tmp/mk");
   WriteBytes("/var/tmp/mk/file", "x");
   FreshDir("/var/tmp/mk/ro");
-  ASSERT_TRUE(platform_test::BindReadOnly("/var/tmp/mk/ro"));
+  ASSERT_TRUE(tavow3::test::BindReadOnly("/var/tmp/mk/ro"));
   struct Case {
     const char* path;
     int flags;
@@ -83,7 +84,7 @@ TEST(TAVOFSMkdirP, Failures) {
     EXPECT_EQ(-1, TAVOFSMkdirP(c.path, c.flags, 1, 1, 1, 0755));
     EXPECT_EQ(c.error, errno);
   }
-  EXPECT_EQ((std::vector<std::string>{"file", "ro"}), Names("/var/tmp/mk"));
+  EXPECT_EQ((std::vector<std::string>{"file", "ro"}), DirNames("/var/tmp/mk"));
 }
 
 TEST(TAVOFileCopy, CopiesBytesAndModeOverTheOldFile) {
@@ -101,7 +102,7 @@ TEST(TAVOFileCopy, CopiesBytesAndModeOverTheOldFile) {
   WriteBytes("/var/tmp/cp/empty", "", 0644);
   EXPECT_EQ(0, TAVOFileCopy("/var/tmp/cp/empty", "/var/tmp/cp/new"));
   EXPECT_EQ("", ReadBytes("/var/tmp/cp/new"));
-  EXPECT_EQ((std::vector<std::string>{"empty", "from", "new", "to"}), Names("/var/tmp/cp"));
+  EXPECT_EQ((std::vector<std::string>{"empty", "from", "new", "to"}), DirNames("/var/tmp/cp"));
 }
 
 // Each failure leaves the target's old bytes and no temporary file.
@@ -109,13 +110,13 @@ TEST(TAVOFileCopy, FailuresKeepTheOldFile) {
   FreshDir("/var/tmp/cp");
   WriteBytes("/var/tmp/cp/from", std::string(64 * 1024, 'n'));
   WriteBytes("/var/tmp/cp/ro/to", "old");
-  ASSERT_TRUE(platform_test::BindReadOnly("/var/tmp/cp/ro"));
-  ASSERT_TRUE(platform_test::MountTmpfs("/var/tmp/cp/full", "size=16k"));
+  ASSERT_TRUE(tavow3::test::BindReadOnly("/var/tmp/cp/ro"));
+  ASSERT_TRUE(tavow3::test::MountTmpfs("/var/tmp/cp/full", "size=16k"));
   WriteBytes("/var/tmp/cp/full/to", "old");
   WriteBytes("/var/tmp/cp/locked/to", "old");
-  ASSERT_TRUE(platform_test::SetImmutable("/var/tmp/cp/locked", true));
+  ASSERT_TRUE(tavow3::test::SetImmutable("/var/tmp/cp/locked", true));
   WriteBytes("/var/tmp/cp/pinned/to", "old");
-  ASSERT_TRUE(platform_test::SetImmutable("/var/tmp/cp/pinned/to", true));
+  ASSERT_TRUE(tavow3::test::SetImmutable("/var/tmp/cp/pinned/to", true));
   FreshDir("/var/tmp/cp/dir");
   struct Case {
     const char* from;
@@ -142,12 +143,12 @@ TEST(TAVOFileCopy, FailuresKeepTheOldFile) {
                           "/var/tmp/cp/pinned"}) {
     SCOPED_TRACE(dir);
     EXPECT_EQ("old", ReadBytes(std::string(dir) + "/to"));
-    EXPECT_EQ(std::vector<std::string>{"to"}, Names(dir));
+    EXPECT_EQ(std::vector<std::string>{"to"}, DirNames(dir));
   }
   EXPECT_EQ(-1, TAVOFileCopy(nullptr, "/var/tmp/cp/x"));
   EXPECT_EQ(-1, TAVOFileCopy("/var/tmp/cp/from", nullptr));
-  EXPECT_TRUE(platform_test::SetImmutable("/var/tmp/cp/locked", false));
-  EXPECT_TRUE(platform_test::SetImmutable("/var/tmp/cp/pinned/to", false));
+  EXPECT_TRUE(tavow3::test::SetImmutable("/var/tmp/cp/locked", false));
+  EXPECT_TRUE(tavow3::test::SetImmutable("/var/tmp/cp/pinned/to", false));
 }
 
 }  // namespace

@@ -1,7 +1,7 @@
 #include "tavo/tavotls.h"
 
 #include <gtest/gtest.h>
-#include <json/reader.h>
+#include <json/value.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -11,28 +11,21 @@
 #include <string>
 #include <vector>
 
-#include "test_util.h"
+#include "support/test_files.h"
+#include "support/test_mounts.h"
 
 namespace {
 
-using platform_test::FreshDir;
-using platform_test::Names;
-using platform_test::ReadBytes;
-using platform_test::WriteBytes;
+using tavow3::test::DirNames;
+using tavow3::test::FreshDir;
+using tavow3::test::ReadJson;
+using tavow3::test::ReadBytes;
+using tavow3::test::WriteBytes;
 using tavotls::APIProvider;
 using tavotls::DataStoreProvider;
 
 constexpr char kStore[] = "/usr/tavo/etc/tls/services.json";
 constexpr char kStoreDir[] = "/usr/tavo/etc/tls";
-
-Json::Value Parse(const std::string& text) {
-  Json::Value value;
-  Json::CharReaderBuilder builder;
-  std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
-  std::string errors;
-  EXPECT_TRUE(reader->parse(text.data(), text.data() + text.size(), &value, &errors)) << text;
-  return value;
-}
 
 Json::Value Entry(const std::string& name, const std::string& i18n, int level) {
   Json::Value entry(Json::objectValue);
@@ -92,11 +85,11 @@ TEST_F(TavoTls, JoinSetLevelAndLeaveReachTheStoredFile) {
   services["NewOne"] = Entry("NewOne", "", 1);
   Json::Value stored(Json::objectValue);
   stored["services"] = services;
-  EXPECT_EQ(stored, Parse(ReadBytes(kStore)));
+  EXPECT_EQ(stored, ReadJson(kStore));
   EXPECT_EQ(services, DataStoreProvider::list_services());
   EXPECT_EQ(3, DataStoreProvider::get_service_level("AppPortal_a"));
   EXPECT_EQ(-1, DataStoreProvider::get_service_level("ReverseProxy_b"));
-  EXPECT_EQ(std::vector<std::string>{"services.json"}, Names(kStoreDir));
+  EXPECT_EQ(std::vector<std::string>{"services.json"}, DirNames(kStoreDir));
 }
 
 TEST_F(TavoTls, RefusesMalformedDocumentsAndLevels) {
@@ -148,12 +141,12 @@ TEST_F(TavoTls, InvalidStoreIsNeverOverwritten) {
 TEST_F(TavoTls, StoreFailureKeepsTheOldStore) {
   ASSERT_EQ(0, APIProvider::join_framework(Document({{"a", "b"}})));
   const std::string before = ReadBytes(kStore);
-  ASSERT_TRUE(platform_test::BindReadOnly(kStoreDir));
+  ASSERT_TRUE(tavow3::test::BindReadOnly(kStoreDir));
   EXPECT_EQ(-1, APIProvider::join_framework(Document({{"c", "d"}})));
   EXPECT_EQ(-1, DataStoreProvider::set_service_level("a", 3));
   EXPECT_EQ(before, ReadBytes(kStore));
   EXPECT_EQ(2, DataStoreProvider::get_service_level("a"));
-  EXPECT_EQ(std::vector<std::string>{"services.json"}, Names(kStoreDir));
+  EXPECT_EQ(std::vector<std::string>{"services.json"}, DirNames(kStoreDir));
 }
 
 TEST_F(TavoTls, ConcurrentJoinsLoseNothing) {
@@ -195,7 +188,7 @@ TEST_F(TavoTls, ConcurrentJoinsLoseNothing) {
       EXPECT_EQ(Entry(name, "", i % 5 == 0 ? 3 : 2), services[name]);
     }
   }
-  EXPECT_EQ(std::vector<std::string>{"services.json"}, Names(kStoreDir));
+  EXPECT_EQ(std::vector<std::string>{"services.json"}, DirNames(kStoreDir));
 }
 
 }  // namespace
