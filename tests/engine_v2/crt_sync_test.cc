@@ -14,9 +14,10 @@
 
 #include "engine/crt_sync.h"
 #include "engine/engine_private.h"
-#include "engine_test_util.h"
 #include "support/fake_tools.h"
 #include "support/syslog_capture.h"
+#include "support/test_files.h"
+#include "support/test_mounts.h"
 
 namespace tavow3::test {
 namespace {
@@ -56,11 +57,11 @@ std::set<std::string> TlsServices() {
 }
 
 TEST(W3SyncCrtInfo, NoResourcesStillJoinsAnEmptyList) {
-  const std::vector<std::string> before = Names(kCertificateDir);
+  const std::vector<std::string> before = DirNames(kCertificateDir);
   const std::set<std::string> tls_before = TlsServices();
   EngineV2 engine = EngineWith({});
   EXPECT_TRUE(engine.W3SyncCrtInfo());
-  EXPECT_EQ(before, Names(kCertificateDir));
+  EXPECT_EQ(before, DirNames(kCertificateDir));
   EXPECT_TRUE(FakeCalls("tavocrtregister").empty());
   EXPECT_EQ(tls_before, TlsServices());
 }
@@ -115,9 +116,8 @@ TEST(W3SyncCrtInfo, TlsDocumentNamesEveryService) {
 void InstallToolFailingFor(const std::string& failing) {
   const std::string tool = "/usr/tavo/bin/tavocrtregister";
   ASSERT_EQ(0, ::unlink(tool.c_str()));
-  WriteBytes(tool, "#!/bin/sh\necho \"$1\" >> /run/crt-runs\ntest \"$1\" != \"" + failing +
-                       "\"\n");
-  ASSERT_EQ(0, ::chmod(tool.c_str(), 0755));
+  WriteBytes(tool, "#!/bin/sh\necho \"$1\" >> /run/crt-runs\ntest \"$1\" != \"" + failing + "\"\n",
+             0755);
 }
 
 TEST(W3SyncCrtInfo, OneFailedRegistrationSkipsTheFramework) {
@@ -164,13 +164,13 @@ TEST(W3SyncCrtInfo, UnwritableDocumentStillRunsTheTool) {
     if (c.read_only) {
       ASSERT_TRUE(BindReadOnly(kCertificateDir));
     }
-    const std::vector<std::string> before = Names(kCertificateDir);
+    const std::vector<std::string> before = DirNames(kCertificateDir);
     ClearLog();
     EngineV2 engine = EngineWith(c.resources);
     EXPECT_TRUE(engine.W3SyncCrtInfo());
     EXPECT_EQ(c.calls, FakeCalls("tavocrtregister"));
     EXPECT_EQ(std::vector<std::string>{}, LogMessages(LOG_ERR));
-    EXPECT_EQ(before, Names(kCertificateDir));
+    EXPECT_EQ(before, DirNames(kCertificateDir));
     const Json::Value tls = tavotls::DataStoreProvider::list_services();
     for (const CrtResource& resource : c.resources) {
       EXPECT_TRUE(tls.isMember(resource.subscriber + "_" + resource.service)) << resource.subscriber;

@@ -10,7 +10,8 @@
 
 #include "engine/engine_private.h"
 #include "engine_c_calls.h"
-#include "engine_test_util.h"
+#include "support/test_engine.h"
+#include "support/test_files.h"
 
 namespace tavow3::test {
 namespace {
@@ -64,7 +65,7 @@ TEST(EngineC, OwnerWithoutResourcesDeletesInstalledFile) {
   static_cast<Engine*>(engine)->impl().load_state = 2;  // no registration callbacks
   EXPECT_EQ(1, TAVOW3_Engine_RegenAll(engine));
   TAVOW3_Engine_Release(engine);
-  EXPECT_FALSE(Exists(kSystemFile));
+  EXPECT_FALSE(PathExists(kSystemFile));
 }
 
 TEST(EngineC, EveryNameIsExportedUnmangled) {

@@ -16,8 +16,10 @@
 
 #include "base/fault.h"
 #include "engine/engine_private.h"
-#include "engine_test_util.h"
 #include "support/syslog_capture.h"
+#include "support/test_engine.h"
+#include "support/test_files.h"
+#include "support/test_mounts.h"
 
 namespace tavow3::test {
 namespace {
@@ -169,13 +171,13 @@ TEST(GenerateFirewallConfig, OwnerWithoutResourcesHasNoFile) {
     Engine engine = LoadedEngine();
     Register(engine, 8080, S::HTTP, std::string(owner) == "tavow3" ? "Pagora" : "tavow3");
     EXPECT_TRUE(engine.GenerateFirewallConfig(owner));
-    EXPECT_FALSE(Exists(installed));
+    EXPECT_FALSE(PathExists(installed));
     EXPECT_TRUE(engine.GenerateFirewallConfig(owner)) << "a missing file is no error";
-    EXPECT_TRUE(Names("/var/tmp/tavow3").empty()) << "no work file for an owner without resources";
+    EXPECT_TRUE(DirNames("/var/tmp/tavow3").empty()) << "no work file for an owner without resources";
   }
   WriteBytes(kSystemFile, "[old]\n");
   EXPECT_EQ(1, LoadedEngine().W3FwReGenAll());
-  EXPECT_FALSE(Exists(kSystemFile));
+  EXPECT_FALSE(PathExists(kSystemFile));
 
   // The deletion's own result decides nothing: true and silent even when the
   // file cannot be removed.
@@ -256,7 +258,7 @@ TEST(GenerateFirewallConfig, PackageDirectoryFailures) {
   EXPECT_FALSE(engine.GenerateFirewallConfig("Pagora"));
   EXPECT_EQ(std::vector<std::string>{"engine:381 make directory /usr/local/etc/services.d failed"},
             LogMessages(LOG_ERR));
-  EXPECT_FALSE(Exists(kPackageFile));
+  EXPECT_FALSE(PathExists(kPackageFile));
 
   Engine system = LoadedEngine();
   Register(system, 8080, S::HTTP, "tavow3");
@@ -286,7 +288,7 @@ TEST(GenerateFirewallConfig, SuccessiveRunsBackUpTheInstalledFile) {
   Engine first = LoadedEngine();
   Register(first, 8080, S::HTTP, "tavow3");
   ASSERT_TRUE(first.GenerateFirewallConfig("tavow3"));
-  EXPECT_FALSE(Exists(kSystemBackup)) << "nothing was installed before";
+  EXPECT_FALSE(PathExists(kSystemBackup)) << "nothing was installed before";
   const std::string first_file = ReadBytes(kSystemFile);
   Engine second = LoadedEngine();
   Register(second, 8081, S::HTTP, "tavow3");

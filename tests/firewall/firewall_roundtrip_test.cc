@@ -7,7 +7,8 @@
 #include <gtest/gtest.h>
 #include <tavo/service_conf.h>
 
-#include "engine_test_util.h"
+#include "support/test_engine.h"
+#include "support/test_files.h"
 
 namespace tavow3::test {
 namespace {
