@@ -1,24 +1,17 @@
 // tavomustache's renderer: JSON values as mustache data and the escapings.
-#include <json/reader.h>
+#include <json/value.h>
 
-#include <memory>
 #include <string>
 
 #include <gtest/gtest.h>
 
 #include "render.h"
+#include "support/test_files.h"
 
 namespace tavomustache {
 namespace {
 
-Json::Value Parse(const std::string& text) {
-  Json::Value value;
-  Json::CharReaderBuilder builder;
-  std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
-  std::string errors;
-  EXPECT_TRUE(reader->parse(text.data(), text.data() + text.size(), &value, &errors)) << errors;
-  return value;
-}
+using tavow3::test::ParseJson;
 
 struct Case {
   const char* name;
@@ -57,7 +50,7 @@ TEST(MustacheRender, JsonValuesAndEscapings) {
   for (const Case& c : cases) {
     SCOPED_TRACE(c.name);
     std::string output, error;
-    ASSERT_TRUE(Render(c.tmpl, Parse(c.json), c.escape, &output, &error)) << error;
+    ASSERT_TRUE(Render(c.tmpl, ParseJson(c.json), c.escape, &output, &error)) << error;
     EXPECT_EQ(c.output, output);
   }
 }
@@ -84,11 +77,11 @@ TEST(MustacheRender, RefusesWhatItCannotRenderCorrectly) {
   for (const auto& c : cases) {
     SCOPED_TRACE(c.name);
     std::string output, error;
-    EXPECT_FALSE(Render(c.tmpl, Parse(c.json), c.escape, &output, &error));
+    EXPECT_FALSE(Render(c.tmpl, ParseJson(c.json), c.escape, &output, &error));
     EXPECT_EQ(c.error, error);
   }
   std::string output, error;
-  EXPECT_TRUE(Render("{{{v}}}", Parse(R"({"v":"a\nb"})"), Escape::kServiceConf, &output, &error))
+  EXPECT_TRUE(Render("{{{v}}}", ParseJson(R"({"v":"a\nb"})"), Escape::kServiceConf, &output, &error))
       << "raw values are the template's business";
 }
 

@@ -4,9 +4,6 @@
 
 #include <atomic>
 #include <cstdio>
-#include <filesystem>
-#include <fstream>
-#include <sstream>
 #include <string>
 #include <thread>
 #include <vector>
@@ -14,34 +11,25 @@
 #include <gtest/gtest.h>
 #include <tavo/tlib_exec.h>
 
+#include "support/test_files.h"
+
 namespace {
 
-namespace fs = std::filesystem;
+using tavow3::test::DirNames;
+using tavow3::test::MakeDirs;
+using tavow3::test::PathExists;
+using tavow3::test::ReadBytes;
+using tavow3::test::WriteBytes;
 
 constexpr char kTool[] = "/usr/tavo/bin/tavomustache";
 constexpr char kIn[] = "/tmp/mustache-in";
 constexpr char kOutDir[] = "/tmp/mustache-out";
 constexpr char kOut[] = "/tmp/mustache-out/out.sc";
 
-std::string Read(const std::string& path) {
-  std::ifstream in(path, std::ios::binary);
-  if (!in) return "<missing>";
-  std::ostringstream bytes;
-  bytes << in.rdbuf();
-  return bytes.str();
-}
-
 std::string Write(const std::string& name, const std::string& bytes) {
-  fs::create_directories(kIn);
   const std::string path = std::string(kIn) + "/" + name;
-  std::ofstream(path, std::ios::binary | std::ios::trunc) << bytes;
+  WriteBytes(path, bytes);
   return path;
-}
-
-std::vector<std::string> Names(const std::string& dir) {
-  std::vector<std::string> names;
-  for (const auto& entry : fs::directory_iterator(dir)) names.push_back(entry.path().filename());
-  return names;
 }
 
 // Runs the tool; returns its exit status and stores what it printed.
@@ -59,20 +47,20 @@ int RunTool(const std::vector<std::string>& args, std::string* printed) {
 }
 
 TEST(Tavomustache, RendersIntoAFreshFile) {
-  fs::create_directories(kOutDir);
+  MakeDirs(kOutDir);
   const std::string tmpl = Write("t.mustache", "{{#s}}[{{n}}] v=\"{{v}}\"\n{{/s}}");
   const std::string json = Write("d.json", R"({"s":[{"n":"a","v":"x\"y"},{"n":"b","v":"z"}]})");
   std::string printed;
   ASSERT_EQ(0, RunTool({tmpl, json, "-o", kOut}, &printed)) << printed;
   EXPECT_EQ("", printed);
-  EXPECT_EQ("[a] v=\"x\\\"y\"\n[b] v=\"z\"\n", Read(kOut));
+  EXPECT_EQ("[a] v=\"x\\\"y\"\n[b] v=\"z\"\n", ReadBytes(kOut));
   struct stat st;
   ASSERT_EQ(0, ::stat(kOut, &st));
   EXPECT_EQ(0644u, st.st_mode & 07777);
-  EXPECT_EQ(std::vector<std::string>{"out.sc"}, Names(kOutDir));
+  EXPECT_EQ(std::vector<std::string>{"out.sc"}, DirNames(kOutDir));
 
   ASSERT_EQ(0, RunTool({"-o", kOut, "--escape", "html", tmpl, json}, &printed)) << printed;
-  EXPECT_EQ("[a] v=\"x&quot;y\"\n[b] v=\"z\"\n", Read(kOut)) << "options go anywhere";
+  EXPECT_EQ("[a] v=\"x&quot;y\"\n[b] v=\"z\"\n", ReadBytes(kOut)) << "options go anywhere";
 }
 
 TEST(Tavomustache, FailureLeavesTheOldOutput) {
@@ -98,18 +86,18 @@ TEST(Tavomustache, FailureLeavesTheOldOutput) {
   };
   for (const auto& c : cases) {
     SCOPED_TRACE(c.name);
-    fs::create_directories(kOutDir);
-    std::ofstream(kOut, std::ios::trunc) << "old";
+    MakeDirs(kOutDir);
+    WriteBytes(kOut, "old");
     std::string printed;
     EXPECT_EQ(1, RunTool({c.tmpl, c.json, "-o", kOut}, &printed));
     EXPECT_EQ(c.message, printed);
-    EXPECT_EQ("old", Read(kOut));
-    EXPECT_EQ(std::vector<std::string>{"out.sc"}, Names(kOutDir)) << "no temporary left";
+    EXPECT_EQ("old", ReadBytes(kOut));
+    EXPECT_EQ(std::vector<std::string>{"out.sc"}, DirNames(kOutDir)) << "no temporary left";
   }
 }
 
 TEST(Tavomustache, ReadersSeeTheOldOrTheNewOutputWhole) {
-  fs::create_directories(kOutDir);
+  MakeDirs(kOutDir);
   const size_t size = 1 << 20;
   const std::string tmpl = Write("t.mustache", "{{v}}");
   const std::string a = Write("a.json", "{\"v\":\"" + std::string(size, 'a') + "\"}");
@@ -120,7 +108,7 @@ TEST(Tavomustache, ReadersSeeTheOldOrTheNewOutputWhole) {
   int reads = 0, torn = 0;
   std::thread reader([&] {
     while (!done) {
-      const std::string bytes = Read(kOut);
+      const std::string bytes = ReadBytes(kOut);
       ++reads;
       if (bytes != std::string(size, 'a') && bytes != std::string(size, 'b')) ++torn;
     }
@@ -141,9 +129,9 @@ TEST(Tavomustache, OutputPathAndArgumentErrors) {
             "No such file or directory\n",
             printed);
 
-  fs::create_directories("/tmp/out-is-dir/out");
+  MakeDirs("/tmp/out-is-dir/out");
   EXPECT_EQ(1, RunTool({tmpl, json, "-o", "/tmp/out-is-dir/out"}, &printed));
-  EXPECT_EQ(std::vector<std::string>{"out"}, Names("/tmp/out-is-dir")) << "no temporary left";
+  EXPECT_EQ(std::vector<std::string>{"out"}, DirNames("/tmp/out-is-dir")) << "no temporary left";
 
   const std::string usage = "usage: tavomustache [--escape sc|html|none] TEMPLATE JSON -o OUT\n";
   const struct {
@@ -161,7 +149,7 @@ TEST(Tavomustache, OutputPathAndArgumentErrors) {
     EXPECT_EQ(2, RunTool(w.args, &printed));
     EXPECT_EQ("tavomustache: " + w.message + "\n" + usage, printed);
   }
-  EXPECT_FALSE(fs::exists("/tmp/x"));
+  EXPECT_FALSE(PathExists("/tmp/x"));
 }
 
 }  // namespace
