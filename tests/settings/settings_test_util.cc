@@ -1,9 +1,7 @@
 #include "settings/settings_test_util.h"
 
-#define PCRE2_CODE_UNIT_WIDTH 8
 #include <dirent.h>
 #include <gtest/gtest.h>
-#include <pcre2.h>
 #include <sys/stat.h>
 
 #include <algorithm>
@@ -45,22 +43,6 @@ std::vector<std::string> DirNames(const std::string& dir) {
 
 void MustRun(const std::vector<std::string>& argv) {
   ASSERT_EQ(0, base::Run(argv)) << argv[0] << (argv.size() > 1 ? " " + argv[1] : "");
-}
-
-bool HasLogMatching(const std::vector<std::string>& messages, const std::string& pattern) {
-  int error;
-  PCRE2_SIZE offset;
-  pcre2_code* re = pcre2_compile(reinterpret_cast<PCRE2_SPTR>(pattern.c_str()), pattern.size(),
-                                 PCRE2_ANCHORED | PCRE2_ENDANCHORED, &error, &offset, nullptr);
-  EXPECT_NE(nullptr, re) << "bad pattern " << pattern;
-  if (re == nullptr) return false;
-  pcre2_match_data* match = pcre2_match_data_create_from_pattern(re, nullptr);
-  const bool found = std::any_of(messages.begin(), messages.end(), [&](const std::string& m) {
-    return pcre2_match(re, reinterpret_cast<PCRE2_SPTR>(m.data()), m.size(), 0, 0, match, nullptr) >= 0;
-  });
-  pcre2_match_data_free(match);
-  pcre2_code_free(re);
-  return found;
 }
 
 }  // namespace tavow3::test

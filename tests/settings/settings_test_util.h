@@ -17,8 +17,6 @@ std::string ReadRaw(const std::string& path);
 std::vector<std::string> DirNames(const std::string& dir);
 // Runs argv and asserts it exits 0 (mount, mkdir and the like).
 void MustRun(const std::vector<std::string>& argv);
-// True when some message matches the regular expression `pattern` (PCRE2) entirely.
-bool HasLogMatching(const std::vector<std::string>& messages, const std::string& pattern);
 
 }  // namespace tavow3::test
 

@@ -1,5 +1,7 @@
 #include "support/syslog_capture.h"
 
+#define PCRE2_CODE_UNIT_WIDTH 8
+#include <pcre2.h>
 #include <syslog.h>
 #include <time.h>
 #include <unistd.h>
@@ -153,6 +155,47 @@ std::vector<std::string> LogMessages(int priority) {
     if (entry.priority == priority) messages.push_back(std::move(entry.message));
   }
   return messages;
+}
+
+std::vector<std::string> TaggedLogMessages(const std::string& tag) {
+  std::vector<std::string> tagged;
+  for (std::string& message : LogMessages()) {
+    if (message.compare(0, tag.size() + 1, tag + ":") == 0) tagged.push_back(std::move(message));
+  }
+  return tagged;
+}
+
+std::vector<std::string> TaggedLogMessages(const std::string& tag, int priority) {
+  std::vector<std::string> tagged;
+  for (std::string& message : LogMessages(priority)) {
+    if (message.compare(0, tag.size() + 1, tag + ":") == 0) tagged.push_back(std::move(message));
+  }
+  return tagged;
+}
+
+std::vector<std::string> LogsMatching(const std::vector<std::string>& messages,
+                                      const std::string& pattern) {
+  int error;
+  PCRE2_SIZE offset;
+  pcre2_code* re = pcre2_compile(reinterpret_cast<PCRE2_SPTR>(pattern.c_str()), pattern.size(),
+                                 PCRE2_ANCHORED | PCRE2_ENDANCHORED, &error, &offset, nullptr);
+  EXPECT_NE(nullptr, re) << "bad pattern " << pattern;
+  std::vector<std::string> matching;
+  if (re == nullptr) return matching;
+  pcre2_match_data* match = pcre2_match_data_create_from_pattern(re, nullptr);
+  for (const std::string& m : messages) {
+    if (pcre2_match(re, reinterpret_cast<PCRE2_SPTR>(m.data()), m.size(), 0, 0, match, nullptr) >=
+        0) {
+      matching.push_back(m);
+    }
+  }
+  pcre2_match_data_free(match);
+  pcre2_code_free(re);
+  return matching;
+}
+
+bool HasLogMatching(const std::vector<std::string>& messages, const std::string& pattern) {
+  return !LogsMatching(messages, pattern).empty();
 }
 
 void ClearLog() {

@@ -17,6 +17,18 @@ std::vector<std::string> LogMessages();
 // LogMessages() of one priority (LOG_ERR, ...).
 std::vector<std::string> LogMessages(int priority);
 
+// LogMessages() whose source tag is `tag` ("nginx_deploy:..." for "nginx_deploy").
+std::vector<std::string> TaggedLogMessages(const std::string& tag);
+// The same at one priority.
+std::vector<std::string> TaggedLogMessages(const std::string& tag, int priority);
+
+// The messages that the regular expression `pattern` (PCRE2) matches entirely;
+// a malformed pattern fails the test.
+std::vector<std::string> LogsMatching(const std::vector<std::string>& messages,
+                                      const std::string& pattern);
+// True when one of `messages` matches `pattern` entirely.
+bool HasLogMatching(const std::vector<std::string>& messages, const std::string& pattern);
+
 // Forgets the messages so far: later LogMessages() calls start after this point.
 void ClearLog();
 

@@ -1,10 +1,7 @@
 #include "zam/zam_test_util.h"
 
-#define PCRE2_CODE_UNIT_WIDTH 8
-
 #include <gtest/gtest.h>
 #include <json/reader.h>
-#include <pcre2.h>
 
 #include <fstream>
 #include <sstream>
@@ -46,38 +43,8 @@ Json::Value ParseJson(const std::string& text) {
   return value;
 }
 
-namespace {
-
-// The messages of `messages` that `pattern` (PCRE2) matches entirely.
-std::vector<std::string> Matching(const std::vector<std::string>& messages,
-                                  const std::string& pattern) {
-  int error;
-  PCRE2_SIZE offset;
-  pcre2_code* re = pcre2_compile(reinterpret_cast<PCRE2_SPTR>(pattern.c_str()), pattern.size(),
-                                 PCRE2_ANCHORED | PCRE2_ENDANCHORED, &error, &offset, nullptr);
-  EXPECT_NE(nullptr, re) << "bad pattern " << pattern;
-  std::vector<std::string> matching;
-  if (re == nullptr) return matching;
-  pcre2_match_data* match = pcre2_match_data_create_from_pattern(re, nullptr);
-  for (const std::string& m : messages) {
-    if (pcre2_match(re, reinterpret_cast<PCRE2_SPTR>(m.data()), m.size(), 0, 0, match, nullptr) >=
-        0) {
-      matching.push_back(m);
-    }
-  }
-  pcre2_match_data_free(match);
-  pcre2_code_free(re);
-  return matching;
-}
-
-}  // namespace
-
-bool HasLogMatching(const std::vector<std::string>& messages, const std::string& pattern) {
-  return !Matching(messages, pattern).empty();
-}
-
 std::vector<std::string> LogsMatching(const std::string& pattern) {
-  return Matching(LogMessages(), pattern);
+  return LogsMatching(LogMessages(), pattern);
 }
 
 void FakeProcessorCount(int count) {

@@ -33,8 +33,6 @@ void MustRun(const std::vector<std::string>& argv);
 // Removes `path` when it exists.
 void Remove(const std::string& path);
 Json::Value ParseJson(const std::string& text);
-// True when one of `messages` matches the regular expression `pattern` entirely.
-bool HasLogMatching(const std::vector<std::string>& messages, const std::string& pattern);
 // The messages matching `pattern` entirely.
 std::vector<std::string> LogsMatching(const std::string& pattern);
 
