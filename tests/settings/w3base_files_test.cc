@@ -1,15 +1,14 @@
 // The settings-file primitives against real files, real mounts and the fault hook.
 #include <gtest/gtest.h>
-#include <json/reader.h>
 #include <sys/stat.h>
 
 #include <tavow3/w3base.h>
 
-#include "base/child_process.h"
 #include "base/fault.h"
-#include "manager/manager_test_util.h"
-#include "settings/settings_test_util.h"
 #include "support/syslog_capture.h"
+#include "support/test_files.h"
+#include "support/test_mounts.h"
+#include "support/test_process.h"
 
 namespace tavow3 {
 namespace {
@@ -18,9 +17,11 @@ using test::DirNames;
 using test::HasLogMatching;
 using test::LogMessages;
 using test::MustRun;
+using test::ParseJson;
 using test::PathExists;
-using test::ReadRaw;
-using test::WriteRaw;
+using test::ReadBytes;
+using test::RemoveTree;
+using test::WriteBytes;
 namespace fault = base::fault;
 
 constexpr char kDir[] = "/var/tmp/w3base";
@@ -32,12 +33,6 @@ bool HasTemporary(const std::string& dir, const std::string& prefix) {
     if (name.compare(0, prefix.size(), prefix) == 0) return true;
   }
   return false;
-}
-
-Json::Value Parse(const std::string& text) {
-  Json::Value value;
-  Json::Reader().parse(text, value, false);
-  return value;
 }
 
 TEST(ReadJsonFile, MissingEmptyBrokenAndGoodFiles) {
@@ -64,8 +59,8 @@ TEST(ReadJsonFile, MissingEmptyBrokenAndGoodFiles) {
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.name);
-    MustRun({"/bin/rm", "-rf", kDir});
-    if (c.content != nullptr) WriteRaw(kFile, c.content);
+    RemoveTree(kDir);
+    if (c.content != nullptr) WriteBytes(kFile, c.content);
     test::ClearLog();
     Json::Value out("untouched");
     EXPECT_EQ(c.result, W3Base::ReadJsonFile(kFile, out, c.allow_missing));
@@ -77,7 +72,7 @@ TEST(ReadJsonFile, MissingEmptyBrokenAndGoodFiles) {
       EXPECT_TRUE(log.empty()) << log[0];
     }
     if (c.result && c.content != nullptr && std::string(c.content).find('{') != std::string::npos) {
-      EXPECT_EQ(Parse(c.content), out);
+      EXPECT_EQ(ParseJson(c.content), out);
     } else {
       EXPECT_EQ(Json::Value("untouched"), out);
     }
@@ -89,11 +84,11 @@ TEST(ReadJsonFile, MissingEmptyBrokenAndGoodFiles) {
 
 TEST(WriteJsonFile, CreatesParentsAndSetsOwnerAndMode) {
   const std::string path = "/var/tmp/w3base/a/b/settings.json";
-  MustRun({"/bin/rm", "-rf", kDir});
+  RemoveTree(kDir);
   Json::Value value;
   value["port"] = 5001;
   ASSERT_TRUE(W3Base::WriteJsonFile(path, value));
-  EXPECT_EQ(value, Parse(ReadRaw(path)));
+  EXPECT_EQ(value, ParseJson(ReadBytes(path)));
   for (const std::string& dir : {std::string(kDir), std::string(kDir) + "/a", std::string(kDir) + "/a/b"}) {
     SCOPED_TRACE(dir);
     struct stat st;
@@ -125,8 +120,8 @@ TEST(WriteJsonFile, FailureAtEveryFileCallKeepsOldOrNewBytes) {
     int failures = 0;
     for (;; ++n) {
       SCOPED_TRACE(testing::Message() << "mode " << mode << ", call " << n);
-      MustRun({"/bin/rm", "-rf", kDir});
-      WriteRaw(kFile, "old");
+      RemoveTree(kDir);
+      WriteBytes(kFile, "old");
       bool ok;
       bool fired;
       {
@@ -138,12 +133,12 @@ TEST(WriteJsonFile, FailureAtEveryFileCallKeepsOldOrNewBytes) {
         EXPECT_TRUE(ok);
         break;
       }
-      const std::string bytes = ReadRaw(kFile);
+      const std::string bytes = ReadBytes(kFile);
       if (!ok) {
         ++failures;
         EXPECT_EQ("old", bytes);
       } else {
-        EXPECT_TRUE(bytes == "old" || Parse(bytes) == value) << bytes;
+        EXPECT_TRUE(bytes == "old" || ParseJson(bytes) == value) << bytes;
       }
       if (mode == fault::kOnce) {
         EXPECT_FALSE(HasTemporary(kDir, "settings.json."));
@@ -156,18 +151,17 @@ TEST(WriteJsonFile, FailureAtEveryFileCallKeepsOldOrNewBytes) {
 
 TEST(WriteJsonFile, FullFileSystemIsCaughtBeforeTheRename) {
   const std::string dir = "/var/tmp/full";
-  MustRun({"/bin/mkdir", "-p", dir});
-  MustRun({"/bin/mount", "-t", "tmpfs", "-o", "size=64k", "tmpfs", dir});
+  ASSERT_TRUE(test::MountTmpfs(dir, "size=64k"));
   const std::string path = dir + "/settings.json";
-  WriteRaw(path, "{\"old\": true}");
+  WriteBytes(path, "{\"old\": true}");
   // Fill the file system up to the last block.
   std::vector<std::string> dd = {"/bin/dd", "if=/dev/zero", "of=" + dir + "/filler", "bs=4k"};
-  (void)base::Run(dd);
+  (void)test::RunCommand(dd);
   Json::Value value;
   value["blob"] = std::string(32 * 1024, 'x');
   test::ClearLog();
   EXPECT_FALSE(W3Base::WriteJsonFile(path, value));
-  EXPECT_EQ("{\"old\": true}", ReadRaw(path));
+  EXPECT_EQ("{\"old\": true}", ReadBytes(path));
   EXPECT_EQ((std::vector<std::string>{"filler", "settings.json"}), DirNames(dir));
   EXPECT_TRUE(HasLogMatching(LogMessages(),
                              "tavow3\\.cpp:\\d+ Fail to write file \\(/var/tmp/full/settings\\.json\\.\\w{6}, "
@@ -175,8 +169,7 @@ TEST(WriteJsonFile, FullFileSystemIsCaughtBeforeTheRename) {
 }
 
 TEST(MoveFile, MissingSourceUnreplaceableTargetAndSuccess) {
-  MustRun({"/bin/rm", "-rf", kDir});
-  MustRun({"/bin/mkdir", "-p", kDir});
+  test::FreshDir(kDir);
   const std::string from = std::string(kDir) + "/staged.json";
   const std::string to = std::string(kDir) + "/out/stored.json";
 
@@ -187,8 +180,8 @@ TEST(MoveFile, MissingSourceUnreplaceableTargetAndSuccess) {
 
   // A non-empty directory where the file must go: the rename fails, the move
   // still reports success and the staged file is gone.
-  WriteRaw(from, "staged");
-  WriteRaw(to + "/inner", "x");
+  WriteBytes(from, "staged");
+  WriteBytes(to + "/inner", "x");
   test::ClearLog();
   EXPECT_TRUE(W3Base::MoveFile(from, to));
   EXPECT_FALSE(PathExists(from));
@@ -197,11 +190,11 @@ TEST(MoveFile, MissingSourceUnreplaceableTargetAndSuccess) {
                              "to /var/tmp/w3base/out/stored\\.json, Is a directory"));
   EXPECT_EQ(std::vector<std::string>{"stored.json"}, DirNames(std::string(kDir) + "/out"));
 
-  MustRun({"/bin/rm", "-rf", to});
-  WriteRaw(from, "staged bytes");
+  RemoveTree(to);
+  WriteBytes(from, "staged bytes");
   ASSERT_EQ(0, ::chmod(from.c_str(), 0600));
   EXPECT_TRUE(W3Base::MoveFile(from, to));
-  EXPECT_EQ("staged bytes", ReadRaw(to));
+  EXPECT_EQ("staged bytes", ReadBytes(to));
   EXPECT_FALSE(PathExists(from));
   struct stat st;
   ASSERT_EQ(0, ::stat(to.c_str(), &st));
@@ -214,9 +207,9 @@ TEST(MoveFile, FailureAtEveryFileCallDeletesTheSourceAndKeepsTheTarget) {
     int n = 1;
     for (;; ++n) {
       SCOPED_TRACE(testing::Message() << "mode " << mode << ", call " << n);
-      MustRun({"/bin/rm", "-rf", kDir});
-      WriteRaw(kFile, "old");
-      WriteRaw(from, "new");
+      RemoveTree(kDir);
+      WriteBytes(kFile, "old");
+      WriteBytes(from, "new");
       bool ok;
       bool fired;
       {
@@ -226,10 +219,10 @@ TEST(MoveFile, FailureAtEveryFileCallDeletesTheSourceAndKeepsTheTarget) {
       }
       if (!fired) {
         EXPECT_TRUE(ok);
-        EXPECT_EQ("new", ReadRaw(kFile));
+        EXPECT_EQ("new", ReadBytes(kFile));
         break;
       }
-      const std::string bytes = ReadRaw(kFile);
+      const std::string bytes = ReadBytes(kFile);
       EXPECT_TRUE(ok ? (bytes == "new" || bytes == "old") : bytes == "old") << bytes;
       if (mode == fault::kOnce) {
         EXPECT_FALSE(HasTemporary(kDir, "settings.json."));
@@ -247,7 +240,7 @@ TEST(MakeParentFolderExist, RefusalsAndReadOnlyFileSystem) {
   EXPECT_TRUE(HasLogMatching(log, "tavow3\\.cpp:\\d+ No path found"));
   EXPECT_TRUE(HasLogMatching(log, "tavow3\\.cpp:\\d+ No parent folder found"));
 
-  MustRun({"/bin/mkdir", "-p", "/var/tmp/ro"});
+  test::MakeDirs("/var/tmp/ro");
   MustRun({"/bin/mount", "-t", "tmpfs", "-o", "ro,size=16k", "tmpfs", "/var/tmp/ro"});
   test::ClearLog();
   EXPECT_FALSE(W3Base::MakeParentFolderExist("/var/tmp/ro/a/b/settings.json"));

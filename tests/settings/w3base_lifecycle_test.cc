@@ -5,25 +5,25 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <fstream>
-#include <sstream>
 #include <stdexcept>
 
 #include <tavow3/engine.h>
 #include <tavow3/w3base.h>
 
 #include "engine/engine_private.h"
-#include "settings/settings_test_util.h"
 #include "support/syslog_capture.h"
+#include "support/test_files.h"
+#include "support/test_process.h"
 
 namespace tavow3 {
 namespace {
 
+using test::CanFlock;
 using test::HasLogMatching;
 using test::LogMessages;
 using test::MustRun;
-using test::ReadRaw;
-using test::WriteRaw;
+using test::ReadBytes;
+using test::WriteBytes;
 
 constexpr char kProbeFile[] = "/usr/tavo/etc/www/Probe.json";
 constexpr char kLockFile[] = "/run/lock/tavow3.lock";
@@ -57,15 +57,6 @@ class Probe : public W3Base {
   std::function<void()> on_write;
 };
 
-// Whether another open file description may take the lock file with `operation`.
-bool CanLock(int operation) {
-  const int fd = ::open(kLockFile, O_RDONLY | O_CLOEXEC);
-  if (fd < 0) return false;
-  const bool ok = ::flock(fd, operation | LOCK_NB) == 0;
-  ::close(fd);
-  return ok;
-}
-
 TEST(W3BaseGet, StoredValuesDefaultsAndBrokenFiles) {
   Engine engine;
   struct Case {
@@ -84,8 +75,8 @@ TEST(W3BaseGet, StoredValuesDefaultsAndBrokenFiles) {
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.name);
-    MustRun({"/bin/rm", "-f", kProbeFile});
-    if (c.content != nullptr) WriteRaw(kProbeFile, c.content);
+    test::RemoveTree(kProbeFile);
+    if (c.content != nullptr) WriteBytes(kProbeFile, c.content);
     Probe probe(engine);
     probe.value = 99;
     EXPECT_EQ(c.result, probe.Get());
@@ -95,7 +86,7 @@ TEST(W3BaseGet, StoredValuesDefaultsAndBrokenFiles) {
 }
 
 TEST(W3BaseGet, NoLockFileMeansDefaultsAndNoSaving) {
-  WriteRaw(kProbeFile, "{\"value\": 42}");
+  WriteBytes(kProbeFile, "{\"value\": 42}");
   // Root ignores permission bits: a read-only mount keeps the lock file from being created.
   MustRun({"/bin/mount", "-t", "tmpfs", "-o", "ro,size=16k", "tmpfs", "/run/lock"});
   test::ClearLog();
@@ -110,43 +101,29 @@ TEST(W3BaseGet, NoLockFileMeansDefaultsAndNoSaving) {
   const std::vector<std::string> log = LogMessages();
   EXPECT_TRUE(HasLogMatching(log, "tavow3\\.cpp:\\d+ libtavow3 failed on read file lock, default value used\\."));
   EXPECT_TRUE(HasLogMatching(log, "tavow3\\.cpp:\\d+ libtavow3 failed on read file lock, cancel saving\\."));
-  EXPECT_EQ("{\"value\": 42}", ReadRaw(kProbeFile));
+  EXPECT_EQ("{\"value\": 42}", ReadBytes(kProbeFile));
 }
 
 TEST(W3BaseSave, HoldsTheLockExclusiveOnlyWhileWritingAndSharedAfterAnException) {
   Engine engine;
   Probe probe(engine);
-  ASSERT_TRUE(CanLock(LOCK_SH));
-  ASSERT_FALSE(CanLock(LOCK_EX));  // the engine's shared lock
+  ASSERT_TRUE(CanFlock(kLockFile, LOCK_SH));
+  ASSERT_FALSE(CanFlock(kLockFile, LOCK_EX));  // the engine's shared lock
 
   bool shared_during_write = true;
-  probe.on_write = [&] { shared_during_write = CanLock(LOCK_SH); };
+  probe.on_write = [&] { shared_during_write = CanFlock(kLockFile, LOCK_SH); };
   probe.value = 11;
   EXPECT_TRUE(probe.Save());
   EXPECT_FALSE(shared_during_write);
-  EXPECT_TRUE(CanLock(LOCK_SH));
+  EXPECT_TRUE(CanFlock(kLockFile, LOCK_SH));
   EXPECT_EQ(11, Probe(engine).value);
 
   probe.on_write = nullptr;
   probe.throw_on_build = true;
   EXPECT_THROW(probe.Save(), std::runtime_error);
-  EXPECT_TRUE(CanLock(LOCK_SH));
-  EXPECT_FALSE(CanLock(LOCK_EX));
+  EXPECT_TRUE(CanFlock(kLockFile, LOCK_SH));
+  EXPECT_FALSE(CanFlock(kLockFile, LOCK_EX));
   EXPECT_GE(engine.impl().lock_fd, 0);
-}
-
-// True once /proc/locks shows a blocked flock request of process `pid`.
-bool IsBlockedOnFlock(pid_t pid) {
-  std::ifstream locks("/proc/locks");
-  std::string line;
-  const std::string needle = " " + std::to_string(pid) + " ";
-  while (std::getline(locks, line)) {
-    if (line.find("->") != std::string::npos && line.find("FLOCK") != std::string::npos &&
-        line.find(needle) != std::string::npos) {
-      return true;
-    }
-  }
-  return false;
 }
 
 TEST(W3BaseSave, TwoProcessesSavingAtOnceAreSerialised) {
@@ -179,9 +156,8 @@ TEST(W3BaseSave, TwoProcessesSavingAtOnceAreSerialised) {
     _exit(probe.Save() ? 0 : 1);
   }
   // The second process must be waiting for the exclusive lock, not writing.
-  for (int i = 0; i < 10000 && !IsBlockedOnFlock(second); ++i) ::usleep(1000);
-  EXPECT_TRUE(IsBlockedOnFlock(second));
-  EXPECT_EQ("<missing>", ReadRaw(kProbeFile));
+  EXPECT_TRUE(test::WaitUntil([&] { return test::IsWaitingForFlock(second); }));
+  EXPECT_EQ("<missing>", ReadBytes(kProbeFile));
 
   ASSERT_EQ(1, ::write(release[1], "r", 1));
   int status;
@@ -189,23 +165,23 @@ TEST(W3BaseSave, TwoProcessesSavingAtOnceAreSerialised) {
   EXPECT_EQ(0, WEXITSTATUS(status));
   ASSERT_EQ(second, ::waitpid(second, &status, 0));
   EXPECT_EQ(0, WEXITSTATUS(status));
-  std::string bytes = ReadRaw(kProbeFile);
+  std::string bytes = ReadBytes(kProbeFile);
   EXPECT_NE(std::string::npos, bytes.find("\"value\" : 2")) << bytes;
 }
 
 TEST(W3BaseSet, RestartsOnlyAfterASuccessfulSave) {
   // A stand-in control script records each reload.
-  WriteRaw("/usr/tavo/etc/rc.sysv/nginx.sh", "#!/bin/sh\necho \"$1\" >> /run/nginx-script.log\n");
-  MustRun({"/bin/chmod", "755", "/usr/tavo/etc/rc.sysv/nginx.sh"});
+  WriteBytes("/usr/tavo/etc/rc.sysv/nginx.sh", "#!/bin/sh\necho \"$1\" >> /run/nginx-script.log\n",
+             0755);
   Engine engine;
   Probe probe(engine);
   probe.value = 3;
   EXPECT_TRUE(probe.Set());
-  EXPECT_EQ("reload\n", ReadRaw("/run/nginx-script.log"));
+  EXPECT_EQ("reload\n", ReadBytes("/run/nginx-script.log"));
 
   probe.on_write = [] { MustRun({"/bin/mount", "-t", "tmpfs", "-o", "ro,size=16k", "tmpfs", "/usr/tavo/etc/www"}); };
   EXPECT_FALSE(probe.Set());
-  EXPECT_EQ("reload\n", ReadRaw("/run/nginx-script.log"));
+  EXPECT_EQ("reload\n", ReadBytes("/run/nginx-script.log"));
 }
 
 }  // namespace

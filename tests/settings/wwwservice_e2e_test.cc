@@ -1,25 +1,24 @@
 // The general web service from its settings file to real nginx answering.
 #include <gtest/gtest.h>
 
-#include <algorithm>
 #include <string>
 
-#include <tavo/service_conf.h>
 #include <tavow3/engine.h>
 #include <tavow3/wwwservice.h>
 
-#include "manager/manager_test_util.h"
-#include "settings/settings_test_util.h"
 #include "support/fake_tools.h"
+#include "support/test_files.h"
+#include "support/test_nginx.h"
+#include "support/test_process.h"
 
 namespace tavow3 {
 namespace {
 
+using test::Declares;
 using test::Fetch;
-using test::MustRun;
-using test::ReadRaw;
+using test::ReadBytes;
 using test::RunCommand;
-using test::WriteRaw;
+using test::WriteBytes;
 
 constexpr char kStored[] = "/usr/tavo/etc/www/WWWService.json";
 constexpr char kServiceFile[] = "/usr/tavo/etc/services.d/tavow3.sc";
@@ -29,29 +28,17 @@ bool AnswersSoon(const std::string& url) {
   return test::WaitUntil([&] { return Fetch(url) != "<no answer>"; });
 }
 
-// The ports of every section of the installed firewall service file.
-std::vector<std::string> DeclaredPorts() {
-  std::vector<std::string> ports;
-  TAVO_SERVICE_CONF* conf = nullptr;
-  if (TAVOServiceConfGet(kServiceFile, &conf) != 0) return ports;
-  for (int i = 0; i < conf->port_count; ++i) ports.emplace_back(conf->ports[i]);
-  TAVOServiceConfFree(conf);
-  return ports;
-}
-
-class WWWServiceEndToEnd : public testing::Test {
+class WWWServiceEndToEnd : public test::NginxRunning {
  protected:
   void SetUp() override {
-    const test::RunResult start = RunCommand({test::kNginxScript, "start"});
-    ASSERT_EQ(0, start.status) << start.out << start.err;
+    ASSERT_NO_FATAL_FAILURE(NginxRunning::SetUp());
     ASSERT_NE("<no answer>", Fetch("http://127.0.0.1:5000/"));
   }
-  void TearDown() override { (void)RunCommand({test::kNginxScript, "stop"}); }
 };
 
 TEST_F(WWWServiceEndToEnd, SavedAdditionalPortsAreServedAndDeclared) {
   ASSERT_EQ("<no answer>", Fetch("http://127.0.0.1:8081/"));
-  WriteRaw(kStored,
+  WriteBytes(kStored,
            "{\"additionalPort\": {\"http\": 8081, \"https\": 8444}, "
            "\"ssl\": {\"hsts\": true, \"spdy\": true}}");
   test::ClearFakeCalls("tavofirewall");
@@ -70,25 +57,24 @@ TEST_F(WWWServiceEndToEnd, SavedAdditionalPortsAreServedAndDeclared) {
   EXPECT_NE(std::string::npos, https.out.find("HTTP/2 200")) << https.out;
   EXPECT_NE(std::string::npos, https.out.find("strict-transport-security: max-age=31536000"))
       << https.out;
-  const std::vector<std::string> declared = DeclaredPorts();
-  EXPECT_NE(declared.end(), std::find(declared.begin(), declared.end(), "8081"));
-  EXPECT_NE(declared.end(), std::find(declared.begin(), declared.end(), "8444"));
+  EXPECT_TRUE(Declares("8081"));
+  EXPECT_TRUE(Declares("8444"));
   EXPECT_FALSE(test::FakeCalls("tavofirewall").empty());
 }
 
 TEST_F(WWWServiceEndToEnd, ARejectedConfigurationChangesNothing) {
   const std::string stored = "{\"additionalPort\": {\"http\": 8081}}";
-  WriteRaw(kStored, stored);
+  WriteBytes(kStored, stored);
   {
     Engine engine;
     WWWService www(engine);
     ASSERT_TRUE(www.Set());
   }
   ASSERT_TRUE(AnswersSoon("http://127.0.0.1:8081/"));
-  const std::string service_file = ReadRaw(kServiceFile);
+  const std::string service_file = ReadBytes(kServiceFile);
 
   // A certificate that does not exist: nginx refuses the configuration.
-  WriteRaw(kStored,
+  WriteBytes(kStored,
            "{\"additionalPort\": {\"http\": 8082, \"https\": 8445}, "
            "\"ssl\": {\"certificate\": \"/nowhere/server.crt\"}}");
   {
@@ -98,7 +84,7 @@ TEST_F(WWWServiceEndToEnd, ARejectedConfigurationChangesNothing) {
   }
   EXPECT_NE("<no answer>", Fetch("http://127.0.0.1:8081/"));
   EXPECT_EQ("<no answer>", Fetch("http://127.0.0.1:8082/"));
-  EXPECT_EQ(service_file, ReadRaw(kServiceFile));
+  EXPECT_EQ(service_file, ReadBytes(kServiceFile));
 }
 
 }  // namespace

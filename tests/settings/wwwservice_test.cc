@@ -1,24 +1,25 @@
 // The general web service's settings file rules, registration and staged save.
 #include <gtest/gtest.h>
-#include <json/reader.h>
+
+#include <functional>
 
 #include <tavow3/engine.h>
 #include <tavow3/wwwservice.h>
 
 #include "engine/engine_private.h"
-#include "manager/manager_test_util.h"
-#include "settings/settings_test_util.h"
 #include "support/syslog_capture.h"
+#include "support/test_files.h"
 
 namespace tavow3 {
 namespace {
 
 using test::HasLogMatching;
 using test::LogMessages;
-using test::MustRun;
+using test::ParseJson;
 using test::PathExists;
-using test::ReadRaw;
-using test::WriteRaw;
+using test::ReadBytes;
+using test::RemoveTree;
+using test::WriteBytes;
 
 constexpr char kStored[] = "/usr/tavo/etc/www/WWWService.json";
 constexpr char kStaging[] = "/var/tmp/nginx/WWWService.json";
@@ -26,12 +27,6 @@ constexpr char kScratch[] = "/var/tmp/nginx/WWWService.tmp";
 constexpr char kTempConf[] = "/var/tmp/nginx/nginx.conf";
 constexpr char kDefaultCert[] = "/usr/tavo/etc/ssl/ssl.chain.crt/server.crt";
 constexpr char kDefaultKey[] = "/usr/tavo/etc/ssl/ssl.key/server.key";
-
-Json::Value Parse(const std::string& text) {
-  Json::Value value;
-  Json::Reader().parse(text, value, false);
-  return value;
-}
 
 TEST(WWWService, ReadingRules) {
   struct Case {
@@ -64,8 +59,8 @@ TEST(WWWService, ReadingRules) {
   Engine engine;
   for (const Case& c : cases) {
     SCOPED_TRACE(c.name);
-    MustRun({"/bin/rm", "-f", kStored});
-    if (c.content != nullptr) WriteRaw(kStored, c.content);
+    RemoveTree(kStored);
+    if (c.content != nullptr) WriteBytes(kStored, c.content);
     test::ClearLog();
     WWWService www(engine);
     EXPECT_EQ(c.ok, www.OK());
@@ -98,20 +93,20 @@ TEST(WWWService, WritingRules) {
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.stored ? c.stored : "no file");
-    MustRun({"/bin/rm", "-f", kStored});
-    if (c.stored != nullptr) WriteRaw(kStored, c.stored);
+    RemoveTree(kStored);
+    if (c.stored != nullptr) WriteBytes(kStored, c.stored);
     WWWService www(engine);
     Json::Value value;
     ASSERT_TRUE(www.TransVarToJson(value));
-    EXPECT_EQ(Parse(c.expected), value);
+    EXPECT_EQ(ParseJson(c.expected), value);
     ASSERT_TRUE(www.SetJson(value));
-    EXPECT_EQ(Parse(c.expected), Parse(ReadRaw(kStaging)));
+    EXPECT_EQ(ParseJson(c.expected), ParseJson(ReadBytes(kStaging)));
   }
 }
 
 // The engine's load cycle registers what the stored file holds.
 TEST(WWWService, RegistersTheStoredAdditionalPorts) {
-  WriteRaw(kStored, "{\"additionalPort\": {\"http\": 8081, \"https\": 8444}, \"ssl\": {}}");
+  WriteBytes(kStored, "{\"additionalPort\": {\"http\": 8081, \"https\": 8444}, \"ssl\": {}}");
   Engine engine;
   engine.load();
   const auto& resources = engine.impl().fqdn_resources;
@@ -133,7 +128,7 @@ TEST(WWWService, RegistersTheStoredAdditionalPorts) {
     EXPECT_EQ(0, r->protocol);
   }
 
-  MustRun({"/bin/rm", "-f", kStored});
+  RemoveTree(kStored);
   Engine empty;
   empty.load();
   for (const auto& entry : empty.impl().fqdn_resources) {
@@ -142,46 +137,46 @@ TEST(WWWService, RegistersTheStoredAdditionalPorts) {
   }
 }
 
-// A generator whose configuration nginx rejects: the save fails and leaves the
-// stored file as it was, with no staging, scratch or temporary configuration.
-TEST(WWWService, RejectedConfigurationLeavesTheStoredFile) {
+// A failed save leaves the stored file as it was, with no staging, scratch or
+// temporary configuration: when the firewall file cannot be rendered after the
+// configuration was generated and tested, and when nginx rejects the
+// configuration. In this order: the second breakage stops the save earlier.
+TEST(WWWService, FailedSaveLeavesTheStoredFileAndNoWorkFiles) {
+  struct Case {
+    const char* name;
+    std::function<void()> breakage;
+    const char* log;  // a line expected in the log, or null
+  };
+  const Case cases[] = {
+      {"firewall file cannot be rendered",
+       [] { WriteBytes("/usr/tavo/share/nginx/Firewall.mustache", "{{#sections}}unclosed\n"); },
+       "engine:361 Fail to generate sc file through mustache"},
+      {"nginx rejects the configuration",
+       [] {
+         WriteBytes("/usr/tavo/etc/rc.sysv/nginx-conf-generator.sh",
+                    "#!/bin/sh\necho 'this is not nginx' > /var/tmp/nginx/nginx.conf\n"
+                    "touch /var/tmp/nginx/WWWService.tmp\n",
+                    0755);
+       },
+       nullptr},
+  };
   const std::string stored = "{\"additionalPort\": {\"http\": 8081}}";
-  WriteRaw(kStored, stored);
-  WriteRaw("/usr/tavo/etc/rc.sysv/nginx-conf-generator.sh",
-           "#!/bin/sh\necho 'this is not nginx' > /var/tmp/nginx/nginx.conf\n"
-           "touch /var/tmp/nginx/WWWService.tmp\n");
-  MustRun({"/bin/chmod", "755", "/usr/tavo/etc/rc.sysv/nginx-conf-generator.sh"});
-  Engine engine;
-  WWWService www(engine);
-  EXPECT_FALSE(www.Save());
-  EXPECT_EQ(stored, ReadRaw(kStored));
-  EXPECT_FALSE(PathExists(kStaging));
-  EXPECT_FALSE(PathExists(kScratch));
-  EXPECT_FALSE(PathExists(kTempConf));
-}
-
-}  // namespace
-}  // namespace tavow3
-
-namespace tavow3 {
-namespace {
-
-// The configuration generates and tests fine but the firewall file cannot be
-// rendered: the save fails after the temporary configuration was written, and
-// that configuration goes with the staging and scratch files.
-TEST(WWWService, FirewallFailureAfterGenerationDropsTheTemporaryConfiguration) {
-  const std::string stored = "{\"additionalPort\": {\"http\": 8081}}";
-  WriteRaw(kStored, stored);
-  WriteRaw("/usr/tavo/share/nginx/Firewall.mustache", "{{#sections}}unclosed\n");
-  Engine engine;
-  WWWService www(engine);
-  test::ClearLog();
-  EXPECT_FALSE(www.Save());
-  EXPECT_TRUE(HasLogMatching(LogMessages(), "engine:361 Fail to generate sc file through mustache"));
-  EXPECT_EQ(stored, ReadRaw(kStored));
-  EXPECT_FALSE(PathExists(kStaging));
-  EXPECT_FALSE(PathExists(kScratch));
-  EXPECT_FALSE(PathExists(kTempConf));
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.name);
+    WriteBytes(kStored, stored);
+    c.breakage();
+    Engine engine;
+    WWWService www(engine);
+    test::ClearLog();
+    EXPECT_FALSE(www.Save());
+    if (c.log != nullptr) {
+      EXPECT_TRUE(HasLogMatching(LogMessages(), c.log));
+    }
+    EXPECT_EQ(stored, ReadBytes(kStored));
+    EXPECT_FALSE(PathExists(kStaging));
+    EXPECT_FALSE(PathExists(kScratch));
+    EXPECT_FALSE(PathExists(kTempConf));
+  }
 }
 
 }  // namespace

@@ -97,6 +97,19 @@ bool CanFlock(const std::string& path, int operation) {
   return ok;
 }
 
+bool IsWaitingForFlock(pid_t pid) {
+  std::istringstream locks(ReadBytes("/proc/locks"));
+  for (std::string line; std::getline(locks, line);) {
+    // "1: -> FLOCK  ADVISORY  WRITE 1234 ..." for a request still waiting.
+    std::istringstream fields(line);
+    std::string index, arrow, kind, advisory, access;
+    pid_t owner = 0;
+    fields >> index >> arrow >> kind >> advisory >> access >> owner;
+    if (arrow == "->" && kind == "FLOCK" && owner == pid) return true;
+  }
+  return false;
+}
+
 std::vector<pid_t> ChildrenInState(char state) {
   std::vector<pid_t> children;
   DIR* proc = ::opendir("/proc");

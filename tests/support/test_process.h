@@ -36,6 +36,9 @@ std::vector<std::string> IptablesRules();
 // (LOCK_EX, LOCK_SH) now; false when the file cannot be opened.
 bool CanFlock(const std::string& path, int operation);
 
+// True while /proc/locks shows process `pid` waiting for an flock.
+bool IsWaitingForFlock(pid_t pid);
+
 // Process ids of this process's children whose /proc state is `state` ('Z'),
 // or of every child when `state` is 0.
 std::vector<pid_t> ChildrenInState(char state);
