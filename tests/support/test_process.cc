@@ -1,8 +1,11 @@
 #include "support/test_process.h"
 
+#include <arpa/inet.h>
 #include <dirent.h>
 #include <fcntl.h>
+#include <netinet/in.h>
 #include <sys/file.h>
+#include <sys/socket.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -81,6 +84,22 @@ bool WaitUntil(const std::function<bool()>& done, std::chrono::milliseconds time
 std::string Fetch(const std::string& url) {
   const RunResult run = RunCommand({"/usr/bin/curl", "-sSk", "--max-time", "5", url});
   return run.status == 0 ? run.out : "<no answer>";
+}
+
+LoopbackListener::LoopbackListener(unsigned short port)
+    : fd_(::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
+  const int on = 1;
+  ::setsockopt(fd_, SOL_SOCKET, SO_REUSEADDR, &on, sizeof on);
+  sockaddr_in address{};
+  address.sin_family = AF_INET;
+  address.sin_port = htons(port);
+  address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+  listening_ = ::bind(fd_, reinterpret_cast<sockaddr*>(&address), sizeof address) == 0 &&
+               ::listen(fd_, 1) == 0;
+}
+
+LoopbackListener::~LoopbackListener() {
+  if (fd_ >= 0) ::close(fd_);
 }
 
 std::vector<std::string> IptablesRules() {

@@ -29,6 +29,22 @@ bool WaitUntil(const std::function<bool()>& done,
 
 // The body that `url` serves (curl, certificates not checked), or "<no answer>".
 std::string Fetch(const std::string& url);
+// A TCP socket of this process listening on 127.0.0.1:`port`, closed on
+// destruction: a foreign (non-nginx) process holding the port.
+class LoopbackListener {
+ public:
+  explicit LoopbackListener(unsigned short port);
+  ~LoopbackListener();
+  LoopbackListener(const LoopbackListener&) = delete;
+  LoopbackListener& operator=(const LoopbackListener&) = delete;
+
+  bool listening() const { return listening_; }
+
+ private:
+  int fd_;
+  bool listening_ = false;
+};
+
 // Lines of "iptables -S" in this sandbox.
 std::vector<std::string> IptablesRules();
 

@@ -1,7 +1,6 @@
 // The typical request from end to end: a management tool moves the
 // management interface's HTTPS port, and real nginx follows.
 #include <gtest/gtest.h>
-#include <tavo/service_conf.h>
 #include <tavow3/engine.h>
 #include <tavow3/zam.h>
 
@@ -10,35 +9,23 @@
 #include <string>
 #include <vector>
 
-#include "manager/manager_test_util.h"
 #include "support/fake_tools.h"
-#include "zam/zam_test_util.h"
+#include "support/test_files.h"
+#include "support/test_nginx.h"
+#include "support/test_process.h"
+#include "zam/zam_fixtures.h"
 
 namespace tavow3 {
 namespace {
 
+using test::Declares;
 using test::Fetch;
-using test::FileBytes;
+using test::ReadBytes;
 using test::RunCommand;
 using test::WaitUntil;
 
 constexpr char kNoAnswer[] = "<no answer>";
 constexpr char kManagementPage[] = "Management interface";
-
-// The ports of every section of the installed firewall service file.
-std::vector<std::string> DeclaredPorts() {
-  std::vector<std::string> ports;
-  TAVO_SERVICE_CONF* conf = nullptr;
-  if (TAVOServiceConfGet(test::kFirewallFile, &conf) != 0) return ports;
-  for (int i = 0; i < conf->port_count; ++i) ports.emplace_back(conf->ports[i]);
-  TAVOServiceConfFree(conf);
-  return ports;
-}
-
-bool Declares(const std::string& port) {
-  const std::vector<std::string> ports = DeclaredPorts();
-  return std::find(ports.begin(), ports.end(), port) != ports.end();
-}
 
 // Response headers (lower case, as HTTP/2 sends them) of `url`, or "" without an answer.
 std::string Headers(const std::string& url, const std::vector<std::string>& options = {}) {
@@ -58,15 +45,13 @@ bool HasHeaderSoon(const std::string& url, const std::string& text,
   return WaitUntil([&] { return Headers(url, options).find(text) != std::string::npos; });
 }
 
-class ZAMEndToEnd : public testing::Test {
+class ZAMEndToEnd : public test::NginxRunning {
  protected:
   void SetUp() override {
-    const test::RunResult start = RunCommand({test::kNginxScript, "start"});
-    ASSERT_EQ(0, start.status) << start.out << start.err;
+    ASSERT_NO_FATAL_FAILURE(NginxRunning::SetUp());
     ASSERT_NE(std::string::npos, Fetch("https://127.0.0.1:5001/").find(kManagementPage));
     test::ClearFakeCalls("tavofirewall");
   }
-  void TearDown() override { (void)RunCommand({test::kNginxScript, "stop"}); }
 };
 
 TEST_F(ZAMEndToEnd, MovedHttpsPortIsServedDeclaredAndStored) {
@@ -84,13 +69,13 @@ TEST_F(ZAMEndToEnd, MovedHttpsPortIsServedDeclaredAndStored) {
 
   EXPECT_TRUE(Declares("6001"));
   EXPECT_FALSE(Declares("5001"));
-  const std::string firewall = FileBytes(test::kFirewallFile);
+  const std::string firewall = ReadBytes(test::kFirewallFile);
   EXPECT_NE(std::string::npos, firewall.find("[zma_https]")) << firewall;
   const auto calls = test::FakeCalls("tavofirewall");
   ASSERT_FALSE(calls.empty());
   EXPECT_EQ(std::vector<std::string>{"--reload"}, calls.back());
 
-  const Json::Value stored = test::ParseJson(FileBytes(test::kStored));
+  const Json::Value stored = test::ParseJson(ReadBytes(test::kStored));
   EXPECT_EQ(6001, stored["ssl"]["port"].asInt());
   EXPECT_FALSE(test::PathExists(test::kStaging));
 }
@@ -101,11 +86,11 @@ TEST_F(ZAMEndToEnd, RejectedConfigurationChangesNothing) {
     ZAM zam(engine);
     ASSERT_TRUE(zam.Set());
   }
-  const std::string stored = FileBytes(test::kStored);
-  const std::string firewall = FileBytes(test::kFirewallFile);
+  const std::string stored = ReadBytes(test::kStored);
+  const std::string firewall = ReadBytes(test::kFirewallFile);
   ASSERT_NE("<missing>", firewall);
   // A fragment that nginx refuses: every configuration tested from now on fails.
-  test::WriteFileAt("/usr/local/etc/nginx/conf.d/broken.conf", "bogus_directive on;\n");
+  test::WriteBytes("/usr/local/etc/nginx/conf.d/broken.conf", "bogus_directive on;\n");
   test::ClearFakeCalls("tavofirewall");
   {
     Engine engine;
@@ -113,8 +98,8 @@ TEST_F(ZAMEndToEnd, RejectedConfigurationChangesNothing) {
     ASSERT_TRUE(zam.SetHttpsPort(PortValidator(6002)));
     EXPECT_FALSE(zam.Set());
   }
-  EXPECT_EQ(stored, FileBytes(test::kStored));
-  EXPECT_EQ(firewall, FileBytes(test::kFirewallFile));
+  EXPECT_EQ(stored, ReadBytes(test::kStored));
+  EXPECT_EQ(firewall, ReadBytes(test::kFirewallFile));
   EXPECT_FALSE(test::PathExists(test::kStaging));
   EXPECT_TRUE(test::FakeCalls("tavofirewall").empty());
   EXPECT_NE(std::string::npos, Fetch("https://127.0.0.1:5001/").find(kManagementPage));
@@ -145,7 +130,7 @@ TEST_F(ZAMEndToEnd, HttpsOptionsReachNginx) {
   EXPECT_NE(std::string::npos, redirect.find(" 301 ")) << redirect;
   EXPECT_NE(std::string::npos, redirect.find("location: https://127.0.0.1:5001/some/page"))
       << redirect;
-  EXPECT_NE(std::string::npos, FileBytes("/etc/nginx/nginx.conf").find("worker_connections 4096;"));
+  EXPECT_NE(std::string::npos, ReadBytes("/etc/nginx/nginx.conf").find("worker_connections 4096;"));
 
   {
     Engine engine;

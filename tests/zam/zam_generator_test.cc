@@ -5,15 +5,16 @@
 #include <string>
 #include <vector>
 
-#include "manager/manager_test_util.h"
-#include "zam/zam_test_util.h"
+#include "support/test_files.h"
+#include "support/test_process.h"
+#include "zam/zam_fixtures.h"
 
 namespace tavow3 {
 namespace {
 
-using test::FileBytes;
+using test::ReadBytes;
 using test::RunCommand;
-using test::WriteRaw;
+using test::WriteBytes;
 
 constexpr char kGeneratorTool[] = "/usr/tavo/bin/tavonginxgen";
 
@@ -81,13 +82,13 @@ TEST(ZAMGenerator, ServesTheSettingsFile) {
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.name);
-    test::Remove(test::kStored);
-    test::Remove(test::kStaging);
-    if (c.stored != nullptr) WriteRaw(test::kStored, c.stored);
-    if (c.staged != nullptr) WriteRaw(test::kStaging, c.staged);
+    test::RemoveTree(test::kStored);
+    test::RemoveTree(test::kStaging);
+    if (c.stored != nullptr) WriteBytes(test::kStored, c.stored);
+    if (c.staged != nullptr) WriteBytes(test::kStaging, c.staged);
     const test::RunResult generate = RunCommand({kGeneratorTool});
     ASSERT_EQ(0, generate.status) << generate.err;
-    const std::string conf = FileBytes(test::kTempConf);
+    const std::string conf = ReadBytes(test::kTempConf);
     const std::string management = ManagementPart(conf);
     for (const std::string& text : c.present) {
       EXPECT_NE(std::string::npos, (text.rfind("worker", 0) == 0 ? conf : management).find(text))

@@ -6,10 +6,13 @@
 #include <string>
 #include <vector>
 
-#include "manager/manager_test_util.h"
 #include "support/fake_tools.h"
 #include "support/syslog_capture.h"
-#include "zam/zam_test_util.h"
+#include "support/test_engine.h"
+#include "support/test_files.h"
+#include "support/test_mounts.h"
+#include "support/test_process.h"
+#include "zam/zam_fixtures.h"
 
 namespace tavow3 {
 namespace {
@@ -20,9 +23,9 @@ using test::HasLogMatching;
 using test::LogMessages;
 using test::ParseJson;
 using test::PathExists;
-using test::ReadRaw;
+using test::ReadBytes;
 using test::SetFakeExit;
-using test::WriteRaw;
+using test::WriteBytes;
 
 constexpr char kCertificateDir[] = "/usr/tavo/etc/certificate/system/FQDN";
 constexpr char kServiceFile[] = "/usr/tavo/share/certificate.d/system.cfg";
@@ -64,8 +67,8 @@ TEST(ZAMSave, ProcessCertificate) {
   for (const Case& c : cases) {
     SCOPED_TRACE(c.name);
     Engine engine = test::LoadedEngine();
-    test::Remove(kCertificateDir);
-    test::Remove(kServiceFile);
+    test::RemoveTree(kCertificateDir);
+    test::RemoveTree(kServiceFile);
     if (c.certificate_dir) test::MustRun({"/bin/mkdir", "-p", kCertificateDir});
     for (const char* tool : {"tavocrtregister", "tavocrtunregister"}) {
       test::ClearFakeCalls(tool);
@@ -78,7 +81,7 @@ TEST(ZAMSave, ProcessCertificate) {
     EXPECT_EQ(c.registered, FakeCalls("tavocrtregister"));
     EXPECT_EQ(c.unregistered, FakeCalls("tavocrtunregister"));
     if (!c.registered.empty()) {
-      const Json::Value document = ParseJson(ReadRaw(kServiceFile));
+      const Json::Value document = ParseJson(ReadBytes(kServiceFile));
       EXPECT_EQ("FQDN", document["services"][0]["service"].asString());
       EXPECT_EQ(c.fqdn, document["services"][0]["display_name"].asString());
       EXPECT_FALSE(document["services"][0].isMember("display_name_i18n"));
@@ -93,17 +96,16 @@ TEST(ZAMSave, ProcessCertificate) {
 class ZAMSaveTest : public testing::Test {
  protected:
   void SetUp() override {
-    WriteRaw(test::kStored, kOldStored);
+    WriteBytes(test::kStored, kOldStored);
     // The generator must not have run when the save stops early.
-    test::Remove("/run/generator-ran");
+    test::RemoveTree("/run/generator-ran");
   }
 
   static constexpr char kOldStored[] = R"({"port": 5000, "ssl": {"port": 5001}})";
 };
 
 TEST_F(ZAMSaveTest, CertificateFailureTouchesNoFile) {
-  WriteRaw(test::kGenerator, "#!/bin/sh\ntouch /run/generator-ran\n");
-  test::MustRun({"/bin/chmod", "755", test::kGenerator});
+  WriteBytes(test::kGenerator, "#!/bin/sh\ntouch /run/generator-ran\n", 0755);
   SetFakeExit("tavocrtregister", 1);
   Engine engine;
   ZAM zam(engine);
@@ -111,7 +113,7 @@ TEST_F(ZAMSaveTest, CertificateFailureTouchesNoFile) {
   ASSERT_TRUE(zam.SetHttpsPort(PortValidator(6001)));
   EXPECT_FALSE(zam.Save());
   EXPECT_FALSE(zam.Set());
-  EXPECT_EQ(kOldStored, ReadRaw(test::kStored));
+  EXPECT_EQ(kOldStored, ReadBytes(test::kStored));
   EXPECT_FALSE(PathExists(test::kStaging));
   EXPECT_FALSE(PathExists("/run/generator-ran"));
   EXPECT_TRUE(test::FakeCalls("tavofirewall").empty());
@@ -124,45 +126,54 @@ TEST_F(ZAMSaveTest, InstallsTheStagedFileAfterUpdate) {
   ASSERT_TRUE(zam.SetHttpsPort(PortValidator(6001)));
   ASSERT_TRUE(zam.setHSTS(true));
   ASSERT_TRUE(zam.Save());
-  const Json::Value stored = ParseJson(ReadRaw(test::kStored));
+  const Json::Value stored = ParseJson(ReadBytes(test::kStored));
   EXPECT_EQ(6001, stored["ssl"]["port"].asInt());
   EXPECT_EQ(5000, stored["port"].asInt());
   EXPECT_TRUE(stored["https"]["hsts"].asBool());
   EXPECT_EQ(1, stored["version"].asInt());
   EXPECT_FALSE(PathExists(test::kStaging));
   // The generated configuration stays for the deployment.
-  EXPECT_EQ(test::kValidConf, ReadRaw(test::kTempConf));
+  EXPECT_EQ(test::kValidConf, ReadBytes(test::kTempConf));
   // The firewall file declares the new port and no longer the old one.
-  const std::string firewall = ReadRaw(test::kFirewallFile);
+  const std::string firewall = ReadBytes(test::kFirewallFile);
   EXPECT_NE(std::string::npos, firewall.find("[zma_https]")) << firewall;
   EXPECT_NE(std::string::npos, firewall.find("ports=\"6001\"")) << firewall;
   EXPECT_EQ(std::string::npos, firewall.find("ports=\"5001\"")) << firewall;
 }
 
-TEST_F(ZAMSaveTest, RejectedConfigurationKeepsTheStoredFile) {
-  test::StandInGenerator(test::kInvalidConf);
-  Engine engine;
-  ZAM zam(engine);
-  ASSERT_TRUE(zam.SetHttpsPort(PortValidator(6001)));
-  EXPECT_FALSE(zam.Save());
-  EXPECT_EQ(kOldStored, ReadRaw(test::kStored));
-  EXPECT_FALSE(PathExists(test::kStaging));
-  EXPECT_FALSE(PathExists(test::kScratch));
-  EXPECT_FALSE(PathExists(test::kTempConf));
-  EXPECT_FALSE(PathExists(test::kFirewallFile));
-}
-
-TEST_F(ZAMSaveTest, FailedMoveDropsTheStagedFiles) {
-  test::StandInGenerator(test::kValidConf);
-  Engine engine;
-  ZAM zam(engine);
-  ASSERT_TRUE(zam.SetHttpsPort(PortValidator(6001)));
-  test::BindReadOnly("/usr/tavo/etc/www");
-  EXPECT_FALSE(zam.Save());
-  EXPECT_EQ(kOldStored, ReadRaw(test::kStored));
-  EXPECT_FALSE(PathExists(test::kStaging));
-  EXPECT_FALSE(PathExists(test::kScratch));
-  EXPECT_FALSE(PathExists(test::kTempConf));
+// A failed save drops the staged, scratch and temporary files and keeps the
+// stored one: when nginx rejects the configuration (no firewall file is made
+// either), and when the stored file cannot be replaced. In this order: the
+// read-only mount stays.
+TEST_F(ZAMSaveTest, FailedSaveDropsTheStagedFiles) {
+  struct Case {
+    const char* name;
+    const char* conf;
+    bool read_only;           // the stored file's directory is read-only
+    bool no_firewall_file;    // the failure comes before the firewall file is made
+  };
+  const Case cases[] = {
+      {"rejected configuration", test::kInvalidConf, false, true},
+      {"failed move", test::kValidConf, true, false},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.name);
+    test::StandInGenerator(c.conf);
+    Engine engine;
+    ZAM zam(engine);
+    ASSERT_TRUE(zam.SetHttpsPort(PortValidator(6001)));
+    if (c.read_only) {
+      ASSERT_TRUE(test::BindReadOnly("/usr/tavo/etc/www"));
+    }
+    EXPECT_FALSE(zam.Save());
+    EXPECT_EQ(kOldStored, ReadBytes(test::kStored));
+    EXPECT_FALSE(PathExists(test::kStaging));
+    EXPECT_FALSE(PathExists(test::kScratch));
+    EXPECT_FALSE(PathExists(test::kTempConf));
+    if (c.no_firewall_file) {
+      EXPECT_FALSE(PathExists(test::kFirewallFile));
+    }
+  }
 }
 
 TEST_F(ZAMSaveTest, RestartReloadsThenNotifiesTheFirewall) {
@@ -178,15 +189,16 @@ TEST_F(ZAMSaveTest, RestartReloadsThenNotifiesTheFirewall) {
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.name);
-    WriteRaw(kControlScript, "#!/bin/sh\necho \"$@\" >> /run/control-script.log\nexit " +
-                                 std::to_string(c.reload_exit) + "\n");
-    test::MustRun({"/bin/chmod", "755", kControlScript});
-    test::Remove("/run/control-script.log");
+    WriteBytes(kControlScript,
+               "#!/bin/sh\necho \"$@\" >> /run/control-script.log\nexit " +
+                   std::to_string(c.reload_exit) + "\n",
+               0755);
+    test::RemoveTree("/run/control-script.log");
     test::ClearFakeCalls("tavofirewall");
     Engine engine;
     ZAM zam(engine);
     EXPECT_EQ(c.ok, zam.RestartService());
-    EXPECT_EQ("reload\n", ReadRaw("/run/control-script.log"));
+    EXPECT_EQ("reload\n", ReadBytes("/run/control-script.log"));
     EXPECT_EQ(c.firewall, FakeCalls("tavofirewall"));
   }
 }

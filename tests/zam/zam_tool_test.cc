@@ -4,8 +4,9 @@
 #include <string>
 #include <vector>
 
-#include "manager/manager_test_util.h"
-#include "zam/zam_test_util.h"
+#include "support/test_files.h"
+#include "support/test_process.h"
+#include "zam/zam_fixtures.h"
 
 namespace tavow3 {
 namespace {
@@ -41,7 +42,7 @@ TEST(ZAMTool, ArgumentsAndRefusals) {
     EXPECT_NE(std::string::npos, (run.out + run.err).find(c.output)) << run.out << run.err;
   }
   // Nothing refused reached the settings file.
-  EXPECT_EQ("<missing>", test::FileBytes(test::kStored));
+  EXPECT_EQ("<missing>", test::ReadBytes(test::kStored));
 }
 
 }  // namespace
