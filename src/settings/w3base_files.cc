@@ -24,6 +24,9 @@ constexpr mode_t kFileMode = 0644;
 constexpr mode_t kFolderMode = 0755;
 constexpr uid_t kOwner = 1;
 constexpr gid_t kGroup = 1;
+// Temporary names are formatted into a buffer of this size. A longer pattern
+// is cut short, and mkstemp refuses it for want of its trailing X's.
+constexpr size_t kTempNameBuffer = 1024;
 
 bool IsBlank(const std::string& text) {
   for (unsigned char c : text) {
@@ -32,14 +35,21 @@ bool IsBlank(const std::string& text) {
   return true;
 }
 
+// "%s.XXXXXX" of `path`, as much of it as fits in kTempNameBuffer with the
+// terminating zero.
+std::string TempPattern(const std::string& path) {
+  return (path + ".XXXXXX").substr(0, kTempNameBuffer - 1);
+}
+
 // The temporary name beside `path`. When mkstemp fails the pattern itself is
 // used, as the file is reopened by name anyway.
 std::string MakeTempBeside(const std::string& path) {
+  const std::string pattern = TempPattern(path);
   std::string temp;
-  base::UniqueFd fd = base::MakeTemp(path + ".XXXXXX", &temp);
+  base::UniqueFd fd = base::MakeTemp(pattern, &temp);
   if (!fd) {
     TAVOW3_LOG_ERR("Fail to create temp file (%s, %s)", path.c_str(), std::strerror(errno));
-    return path + ".XXXXXX";
+    return pattern;
   }
   return temp;
 }
@@ -127,7 +137,7 @@ bool W3Base::MoveFile(const std::string& from, const std::string& to) {
   bool ok = false;
   std::string temp;
   if (MakeParentFolderExist(to)) {
-    base::UniqueFd temp_fd = base::MakeTemp(to + ".XXXXXX", &temp);
+    base::UniqueFd temp_fd = base::MakeTemp(TempPattern(to), &temp);
     if (!temp_fd) {
       TAVOW3_LOG_ERR("Fail to create temp file (%s, %s)", to.c_str(), std::strerror(errno));
       temp.clear();
@@ -178,7 +188,7 @@ bool W3Base::MakeParentFolderExist(const std::string& path) {
     TAVOW3_LOG_ERR("No parent folder found");
     return false;
   }
-  const std::string folder = slash == 0 ? "/" : path.substr(0, slash);
+  const std::string folder = path.substr(0, slash);
   if (TAVOFSMkdirP(folder.c_str(), 0, 1, kOwner, kGroup, kFolderMode) != 0) {
     TAVOW3_LOG_ERR("make directory exist failed (%s, %s)", folder.c_str(), std::strerror(errno));
     return false;

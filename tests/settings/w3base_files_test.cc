@@ -247,7 +247,6 @@ TEST(MakeParentFolderExist, RefusalsAndReadOnlyFileSystem) {
   EXPECT_TRUE(HasLogMatching(LogMessages(),
                              "tavow3\\.cpp:\\d+ make directory exist failed \\(/var/tmp/ro/a/b, "
                              "Read-only file system\\)"));
-  EXPECT_TRUE(W3Base::MakeParentFolderExist("/settings.json"));
 }
 
 }  // namespace
