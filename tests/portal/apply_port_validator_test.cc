@@ -1,40 +1,28 @@
 // The port setters' rule: register the new port first, then drop the old one.
 #include "portal/apply_port_validator.h"
 
-#include <arpa/inet.h>
 #include <gtest/gtest.h>
-#include <netinet/in.h>
-#include <sys/socket.h>
-#include <unistd.h>
 
-#include <set>
+#include <functional>
 #include <string>
+#include <utility>
+#include <vector>
 
 #include "engine/engine_private.h"
+#include "support/test_engine.h"
+#include "support/test_process.h"
 
 namespace tavow3 {
 namespace {
 
+using KeyList = std::vector<std::pair<std::string, unsigned short>>;
 using Schema = FQDNPortSchemaResource::Schema;
+using test::Keys;
+using test::LoadedEngine;
 
 FQDNPortSchemaResource PortalResource(const std::string& fqdn, Schema schema) {
   return FQDNPortSchemaResource(fqdn, /*port=*/1, schema, "photo_http", "app:title", "Photo",
                                 "app:desc", /*protocol=*/0, "tavow3");
-}
-
-// An engine marked as loaded: no settings object's registration joins in, so
-// the registry holds exactly what a test registers.
-Engine LoadedEngine() {
-  Engine engine;
-  engine.impl().load_state = 2;
-  return engine;
-}
-
-// The (host name, port) keys the engine holds now.
-std::set<std::pair<std::string, unsigned short>> Registered(Engine& engine) {
-  std::set<std::pair<std::string, unsigned short>> keys;
-  for (const auto& [key, resource] : engine.impl().fqdn_resources) keys.insert(key);
-  return keys;
 }
 
 TEST(ApplyPortValidator, MovesTheRegistrationToTheNewPort) {
@@ -43,7 +31,7 @@ TEST(ApplyPortValidator, MovesTheRegistrationToTheNewPort) {
   ASSERT_EQ(PortChange::kChanged,
             ApplyPortValidator(engine, PortValidator(8080), PortalResource("", Schema::HTTP), &port));
   EXPECT_EQ(8080, port);
-  EXPECT_EQ((std::set<std::pair<std::string, unsigned short>>{{"", 8080}}), Registered(engine));
+  EXPECT_EQ((KeyList{{"", 8080}}), Keys(engine));
   const FQDNPortSchemaResource& stored = engine.impl().fqdn_resources.begin()->second;
   EXPECT_EQ(8080, stored.port);
   EXPECT_EQ("photo_http", stored.section);
@@ -52,54 +40,46 @@ TEST(ApplyPortValidator, MovesTheRegistrationToTheNewPort) {
   ASSERT_EQ(PortChange::kChanged,
             ApplyPortValidator(engine, PortValidator(8081), PortalResource("", Schema::HTTP), &port));
   EXPECT_EQ(8081, port);
-  EXPECT_EQ((std::set<std::pair<std::string, unsigned short>>{{"", 8081}}), Registered(engine));
+  EXPECT_EQ((KeyList{{"", 8081}}), Keys(engine));
   EXPECT_EQ(0u, engine.impl().port_schemas.count(8080));
 }
 
-TEST(ApplyPortValidator, SamePortAndZeroTouchNothing) {
-  Engine engine = LoadedEngine();
-  unsigned short port = 8080;
-  EXPECT_EQ(PortChange::kUnchanged,
-            ApplyPortValidator(engine, PortValidator(8080), PortalResource("", Schema::HTTP), &port));
-  EXPECT_EQ(PortChange::kRefused,
-            ApplyPortValidator(engine, PortValidator(0), PortalResource("", Schema::HTTP), &port));
-  EXPECT_EQ(8080, port);
-  EXPECT_TRUE(Registered(engine).empty());
-}
-
-TEST(ApplyPortValidator, RefusalKeepsTheOldPortRegistered) {
-  Engine engine = LoadedEngine();
-  unsigned short port = 0;
-  ASSERT_EQ(PortChange::kChanged,
-            ApplyPortValidator(engine, PortValidator(8080), PortalResource("", Schema::HTTP), &port));
-  // Another service serves HTTPS on 9443: a port has one schema only.
-  ASSERT_TRUE(RegisterFQDNPortSchemaResource(
-      engine, FQDNPortSchemaResource("other.example", 9443, Schema::HTTPS, "", "", "", "", 0,
-                                     "tavow3")));
-  EXPECT_EQ(PortChange::kRefused,
-            ApplyPortValidator(engine, PortValidator(9443), PortalResource("", Schema::HTTP), &port));
-  EXPECT_EQ(8080, port);
-  EXPECT_EQ((std::set<std::pair<std::string, unsigned short>>{{"", 8080}, {"other.example", 9443}}),
-            Registered(engine));
-}
-
-TEST(ApplyPortValidator, PortInUseByAProcessIsRefused) {
-  const int listener = ::socket(AF_INET, SOCK_STREAM, 0);
-  ASSERT_GE(listener, 0);
-  sockaddr_in address{};
-  address.sin_family = AF_INET;
-  address.sin_port = htons(9191);
-  address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-  ASSERT_EQ(0, ::bind(listener, reinterpret_cast<sockaddr*>(&address), sizeof address));
-  ASSERT_EQ(0, ::listen(listener, 1));
-
-  Engine engine = LoadedEngine();
-  unsigned short port = 8080;
-  EXPECT_EQ(PortChange::kRefused,
-            ApplyPortValidator(engine, PortValidator(9191), PortalResource("", Schema::HTTP), &port));
-  EXPECT_EQ(8080, port);
-  EXPECT_TRUE(Registered(engine).empty());
-  ::close(listener);
+// The same port changes nothing; zero, a port with another schema and a port
+// a process listens on are refused. Either way the old port stays registered.
+TEST(ApplyPortValidator, UnchangedOrRefusedKeepsTheOldPort) {
+  const struct {
+    const char* name;
+    std::function<void(Engine&)> setup;  // starts registered on 8080
+    unsigned short port;
+    PortChange change;
+    KeyList keys;
+  } cases[] = {
+      {"same port", [](Engine&) {}, 8080, PortChange::kUnchanged, {{"", 8080}}},
+      {"zero", [](Engine&) {}, 0, PortChange::kRefused, {{"", 8080}}},
+      // Another service serves HTTPS on 9443: a port has one schema only.
+      {"other schema",
+       [](Engine& engine) {
+         ASSERT_TRUE(RegisterFQDNPortSchemaResource(
+             engine, FQDNPortSchemaResource("other.example", 9443, Schema::HTTPS, "", "", "", "",
+                                            0, "tavow3")));
+       },
+       9443, PortChange::kRefused, {{"", 8080}, {"other.example", 9443}}},
+      {"in use by a process", [](Engine&) {}, 9191, PortChange::kRefused, {{"", 8080}}},
+  };
+  const test::LoopbackListener listener(9191);
+  ASSERT_TRUE(listener.listening());
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.name);
+    Engine engine = LoadedEngine();
+    unsigned short port = 0;
+    ASSERT_EQ(PortChange::kChanged, ApplyPortValidator(engine, PortValidator(8080),
+                                                       PortalResource("", Schema::HTTP), &port));
+    c.setup(engine);
+    EXPECT_EQ(c.change, ApplyPortValidator(engine, PortValidator(c.port),
+                                           PortalResource("", Schema::HTTP), &port));
+    EXPECT_EQ(8080, port);
+    EXPECT_EQ(c.keys, Keys(engine));
+  }
 }
 
 // The old resource is dropped under the resource's host name.
@@ -111,8 +91,7 @@ TEST(ApplyPortValidator, HostNamedResourceMovesToo) {
   ASSERT_TRUE(RegisterFQDNPortSchemaResource(
       engine, FQDNPortSchemaResource("", 8443, Schema::HTTPS, "", "", "", "", 0, "tavow3")));
   ASSERT_EQ(PortChange::kChanged, ApplyPortValidator(engine, PortValidator(8444), resource, &port));
-  EXPECT_EQ((std::set<std::pair<std::string, unsigned short>>{{"", 8443}, {"photo.example", 8444}}),
-            Registered(engine));
+  EXPECT_EQ((KeyList{{"", 8443}, {"photo.example", 8444}}), Keys(engine));
 }
 
 }  // namespace

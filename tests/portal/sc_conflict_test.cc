@@ -7,15 +7,15 @@
 #include <string>
 #include <vector>
 
-#include "portal/portal_files.h"
 #include "support/syslog_capture.h"
+#include "support/test_files.h"
 
 namespace tavow3 {
 namespace {
 
 using test::ClearLog;
-using test::TaggedLogLines;
-using test::WriteFileBytes;
+using test::TaggedLogMessages;
+using test::WriteBytes;
 
 constexpr char kOwnFile[] = "/usr/tavo/etc/services.d/tavow3.sc";
 constexpr char kPackageFile[] = "/usr/local/etc/services.d/Pagora.sc";
@@ -47,12 +47,12 @@ void CheckProbes(const std::vector<Probe>& probes) {
     std::set<unsigned short> ports = probe.ports;
     ClearLog();
     EXPECT_EQ(probe.free, Validator::CheckSCConflict(ports));
-    EXPECT_EQ(ConflictLines(probe.logged), TaggedLogLines("validator"));
+    EXPECT_EQ(ConflictLines(probe.logged), TaggedLogMessages("validator"));
     EXPECT_EQ(probe.ports, ports);
     if (probe.ports.size() == 1) {
       ClearLog();
       EXPECT_EQ(probe.free, Validator::CheckSCConflict(*probe.ports.begin()));
-      EXPECT_EQ(ConflictLines(probe.logged), TaggedLogLines("validator"));
+      EXPECT_EQ(ConflictLines(probe.logged), TaggedLogMessages("validator"));
     }
   }
 }
@@ -66,10 +66,10 @@ TEST(CheckSCConflict, NoServiceFilesClaimNothing) {
 }
 
 TEST(CheckSCConflict, PortsOfBothFilesAreClaimed) {
-  WriteFileBytes(kOwnFile, Section("zma", "5000", "tcp") + Section("zma_https", "5001", "tcp") +
+  WriteBytes(kOwnFile, Section("zma", "5000", "tcp") + Section("zma_https", "5001", "tcp") +
                                Section("http_extra", "8000:8010", "tcp") +
                                Section("media", "7000", "udp"));
-  WriteFileBytes(kPackageFile, Section("Pagora_80", "9000,9443", "tcp"));
+  WriteBytes(kPackageFile, Section("Pagora_80", "9000,9443", "tcp"));
   CheckProbes({
       {{}, true, {}},
       {{80}, true, {}},
@@ -87,16 +87,16 @@ TEST(CheckSCConflict, PortsOfBothFilesAreClaimed) {
 }
 
 TEST(CheckSCConflict, EitherFileAloneClaims) {
-  WriteFileBytes(kPackageFile, Section("Pagora_80", "9000", "tcp"));
+  WriteBytes(kPackageFile, Section("Pagora_80", "9000", "tcp"));
   CheckProbes({{{9000}, false, {9000}}, {{5000}, true, {}}});
-  WriteFileBytes(kOwnFile, Section("zma", "5000", "tcp"));
+  WriteBytes(kOwnFile, Section("zma", "5000", "tcp"));
   ASSERT_EQ(0, ::unlink(kPackageFile));
   CheckProbes({{{9000}, true, {}}, {{5000}, false, {5000}}});
 }
 
 // At most twelve conflicts come back, so at most twelve lines are logged.
 TEST(CheckSCConflict, ReportsTwelveConflictsAtMost) {
-  WriteFileBytes(kOwnFile, Section("range", "1000:2000", "tcp"));
+  WriteBytes(kOwnFile, Section("range", "1000:2000", "tcp"));
   std::set<unsigned short> ports;
   for (unsigned short port = 1000; port < 1020; ++port) ports.insert(port);
   std::vector<int> first_twelve;
@@ -106,12 +106,12 @@ TEST(CheckSCConflict, ReportsTwelveConflictsAtMost) {
 
 // A file that cannot be read or parsed claims nothing; the other still does.
 TEST(CheckSCConflict, UnreadableFileClaimsNothing) {
-  WriteFileBytes(kPackageFile, Section("Pagora_80", "9000", "tcp"));
+  WriteBytes(kPackageFile, Section("Pagora_80", "9000", "tcp"));
   test::MakeDirs(kOwnFile);  // a directory where the file should be
   CheckProbes({{{9000}, false, {9000}}, {{5000}, true, {}}});
 
   ASSERT_EQ(0, ::rmdir(kOwnFile));
-  WriteFileBytes(kOwnFile, Section("zma", "5000", "tcp") + Section("bad", "http", "tcp"));
+  WriteBytes(kOwnFile, Section("zma", "5000", "tcp") + Section("bad", "http", "tcp"));
   CheckProbes({{{9000}, false, {9000}}, {{5000}, true, {}}});
 }
 
