@@ -7,7 +7,8 @@
 
 #include <gtest/gtest.h>
 
-#include "deploy_test_util.h"
+#include "deploy_fixtures.h"
+#include "support/test_files.h"
 
 namespace tavow3::test {
 namespace {
@@ -30,17 +31,17 @@ bool Contains(const std::string& text, const std::string& part) {
 // made anew: the sandbox's overlay cannot rename the packaged ones (EXDEV).
 void PrepareGeneratedTree() {
   RemoveTree(kTempConf);
-  WriteFileAt(kTempConf, MainConf("generated"));
-  WriteFileAt(std::string(kConfDTarget) + "/good.conf", "server { listen 127.0.0.1:8081; }\n");
-  WriteFileAt(std::string(kSitesTarget) + "/site", "server { listen 127.0.0.1:8082; }\n");
-  WriteFileAt(std::string(kAppDTarget) + "/app.conf", "server { listen 127.0.0.1:8083; }\n");
+  WriteBytes(kTempConf, MainConf("generated"));
+  WriteBytes(std::string(kConfDTarget) + "/good.conf", "server { listen 127.0.0.1:8081; }\n");
+  WriteBytes(std::string(kSitesTarget) + "/site", "server { listen 127.0.0.1:8082; }\n");
+  WriteBytes(std::string(kAppDTarget) + "/app.conf", "server { listen 127.0.0.1:8083; }\n");
   for (const char* dir : {kConfD, kSites, kAppD}) RemoveTree(dir);
-  WriteFileAt(std::string(kConfD) + "/old.conf", "this is not nginx syntax\n");
-  WriteFileAt(std::string(kSites) + "/old", "neither is this\n");
+  WriteBytes(std::string(kConfD) + "/old.conf", "this is not nginx syntax\n");
+  WriteBytes(std::string(kSites) + "/old", "neither is this\n");
 }
 
 void BreakFragment(const std::string& dir) {
-  WriteFileAt(dir + "/broken.conf", "server { listen 127.0.0.1:8084; bogus_directive on; }\n");
+  WriteBytes(dir + "/broken.conf", "server { listen 127.0.0.1:8084; bogus_directive on; }\n");
 }
 
 TEST(DeployNginxConfNormal, InstallsTheConfigurationAndLinksAndKeepsThemNextTime) {
@@ -52,24 +53,24 @@ TEST(DeployNginxConfNormal, InstallsTheConfigurationAndLinksAndKeepsThemNextTime
   EXPECT_TRUE(Contains(normal.GetNginxTestMsg(), "syntax is ok\n"));
   EXPECT_TRUE(Contains(normal.GetNginxTestMsg(), "test is successful\n"));
 
-  EXPECT_EQ(MainConf("generated"), FileBytes(kMainConf));
+  EXPECT_EQ(MainConf("generated"), ReadBytes(kMainConf));
   EXPECT_FALSE(PathExists(kTempConf));
   EXPECT_EQ(kConfDTarget, LinkTarget(kConfD));
   EXPECT_EQ(kSitesTarget, LinkTarget(kSites));
   EXPECT_EQ(kAppDTarget, LinkTarget(kAppD));
   // The real directories that stood in the way are kept as backups.
   ASSERT_EQ(1u, BackupsOf(kConfD).size());
-  EXPECT_EQ("this is not nginx syntax\n", FileBytes(BackupsOf(kConfD)[0] + "/old.conf"));
+  EXPECT_EQ("this is not nginx syntax\n", ReadBytes(BackupsOf(kConfD)[0] + "/old.conf"));
   EXPECT_EQ(std::string(kConfD).size() + 7, BackupsOf(kConfD)[0].size());
   ASSERT_EQ(1u, BackupsOf(kSites).size());
-  EXPECT_EQ("neither is this\n", FileBytes(BackupsOf(kSites)[0] + "/old"));
+  EXPECT_EQ("neither is this\n", ReadBytes(BackupsOf(kSites)[0] + "/old"));
   EXPECT_TRUE(BackupsOf(kAppD).empty());
 
   // Next time, without a generated main configuration: all is kept as it is.
   const ino_t links[] = {InodeOf(kConfD), InodeOf(kSites), InodeOf(kAppD)};
   DeployNginxConfNormal again;
   EXPECT_TRUE(again.IsConfValid()) << again.GetNginxTestMsg();
-  EXPECT_EQ(MainConf("generated"), FileBytes(kMainConf));
+  EXPECT_EQ(MainConf("generated"), ReadBytes(kMainConf));
   EXPECT_EQ(links[0], InodeOf(kConfD));
   EXPECT_EQ(links[1], InodeOf(kSites));
   EXPECT_EQ(links[2], InodeOf(kAppD));
@@ -100,10 +101,10 @@ TEST(DeployNginxConfNormal, BrokenFragmentFailsWithNginxsOwnReport) {
 TEST(DeployNginxConfNormal, KeepsTheInstalledConfigurationWithoutAGeneratedOne) {
   PrepareGeneratedTree();
   ASSERT_EQ(0, ::unlink(kTempConf));
-  WriteFileAt(kMainConf, MainConf("installed"));
+  WriteBytes(kMainConf, MainConf("installed"));
   DeployNginxConfNormal normal;
   EXPECT_TRUE(normal.IsConfValid()) << normal.GetNginxTestMsg();
-  EXPECT_EQ(MainConf("installed"), FileBytes(kMainConf));
+  EXPECT_EQ(MainConf("installed"), ReadBytes(kMainConf));
   EXPECT_EQ(kAppDTarget, LinkTarget(kAppD));
 }
 
@@ -113,8 +114,8 @@ TEST(NginxConfDeployer, FailedInstallOfTheMainConfigurationStopsTheFileWork) {
     PrepareGeneratedTree();
     // mv cannot put a directory over the installed file: exit status 1.
     ASSERT_EQ(0, ::unlink(kTempConf));
-    WriteFileAt(std::string(kTempConf) + "/inside", "x\n");
-    WriteFileAt(kMainConf, MainConf("installed"));
+    WriteBytes(std::string(kTempConf) + "/inside", "x\n");
+    WriteBytes(kMainConf, MainConf("installed"));
     std::unique_ptr<NginxConfDeployer> deployer;
     if (abnormal) {
       deployer = std::make_unique<DeployNginxConfAbnormal>();
@@ -123,7 +124,7 @@ TEST(NginxConfDeployer, FailedInstallOfTheMainConfigurationStopsTheFileWork) {
     }
     EXPECT_FALSE(deployer->IsConfValid());
     EXPECT_TRUE(deployer->GetNginxTestMsg().empty());  // nginx never ran
-    EXPECT_EQ(MainConf("installed"), FileBytes(kMainConf));
+    EXPECT_EQ(MainConf("installed"), ReadBytes(kMainConf));
     EXPECT_TRUE(IsDirectory(kConfD));
     EXPECT_TRUE(BackupsOf(kConfD).empty());
     EXPECT_FALSE(PathExists(kAppD));
@@ -164,21 +165,21 @@ TEST(DeployNginxConfAbnormal, MovesRealDirectoriesAside) {
   EXPECT_FALSE(PathExists(kConfD));
   EXPECT_FALSE(PathExists(kSites));
   ASSERT_EQ(1u, BackupsOf(kConfD).size());
-  EXPECT_EQ("this is not nginx syntax\n", FileBytes(BackupsOf(kConfD)[0] + "/old.conf"));
+  EXPECT_EQ("this is not nginx syntax\n", ReadBytes(BackupsOf(kConfD)[0] + "/old.conf"));
   ASSERT_EQ(1u, BackupsOf(kSites).size());
   EXPECT_EQ(kAppDTarget, LinkTarget(kAppD));
 }
 
 TEST(DeployNginxConfDefault, TouchesNothingAndIsValidWithoutNginx) {
   PrepareGeneratedTree();
-  WriteFileAt(kMainConf, "broken {\n");
+  WriteBytes(kMainConf, "broken {\n");
   ASSERT_EQ(0, ::unlink("/usr/bin/nginx"));
   DeployNginxConfDefault deployer;
   EXPECT_EQ("Default", deployer.GetNginxModeString());
   EXPECT_TRUE(deployer.IsConfValid());
   EXPECT_TRUE(deployer.GetNginxTestMsg().empty());
-  EXPECT_EQ(MainConf("generated"), FileBytes(kTempConf));
-  EXPECT_EQ("broken {\n", FileBytes(kMainConf));
+  EXPECT_EQ(MainConf("generated"), ReadBytes(kTempConf));
+  EXPECT_EQ("broken {\n", ReadBytes(kMainConf));
   EXPECT_TRUE(IsDirectory(kConfD));
   EXPECT_TRUE(IsDirectory(kSites));
   EXPECT_FALSE(PathExists(kAppD));

@@ -10,9 +10,10 @@
 
 #include <gtest/gtest.h>
 
-#include "deploy_test_util.h"
 #include "support/fake_tools.h"
 #include "support/syslog_capture.h"
+#include "support/test_files.h"
+#include "support/test_process.h"
 
 namespace tavow3::test {
 namespace {
@@ -50,7 +51,7 @@ void InterposeIptables() {
   }
   // A multi-call binary takes the tool's name as its first argument.
   const bool multi_call = real.find("multi") != std::string::npos;
-  WriteFileAt("/usr/bin/iptables",
+  WriteBytes("/usr/bin/iptables",
               "#!/bin/sh\n"
               "pattern=$(cat " + std::string(kFailPatternFile) + " 2>/dev/null)\n"
               "if [ -n \"$pattern\" ]; then\n"
@@ -61,7 +62,7 @@ void InterposeIptables() {
 }
 
 void FailIptablesRunsStartingWith(const std::string& pattern) {
-  WriteFileAt(kFailPatternFile, pattern);
+  WriteBytes(kFailPatternFile, pattern);
 }
 
 TEST(FwStrategyZAMDefault, AddsTheRuleOnce) {
@@ -84,7 +85,7 @@ TEST(FwStrategyClear, ReloadsFlushesAndUnhooks) {
   EXPECT_TRUE(FwStrategyClear().ApplyFirewallStrategy());
   EXPECT_TRUE(ChainIsGone());
   EXPECT_EQ(std::vector<std::vector<std::string>>{{"--reload"}}, FakeCalls("tavofirewall"));
-  EXPECT_TRUE(DeployLog().empty());
+  EXPECT_TRUE(TaggedLogMessages("nginx_deploy").empty());
 
   // Nothing loaded: only the reload runs, and its result decides.
   EXPECT_TRUE(FwStrategyClear().ApplyFirewallStrategy());
@@ -92,7 +93,7 @@ TEST(FwStrategyClear, ReloadsFlushesAndUnhooks) {
   SetFakeExit("tavofirewall", 3);
   EXPECT_FALSE(FwStrategyClear().ApplyFirewallStrategy());
   EXPECT_EQ(std::vector<std::string>{"nginx_deploy:398 Failed to reload tavofirewall"},
-            DeployLog());
+            TaggedLogMessages("nginx_deploy"));
   EXPECT_TRUE(ChainIsGone());
 }
 
@@ -102,7 +103,7 @@ TEST(FwStrategyClear, FailingReloadStillFlushesAndUnloads) {
   ClearLog();
   EXPECT_FALSE(FwStrategyClear().ApplyFirewallStrategy());
   EXPECT_EQ(std::vector<std::string>{"nginx_deploy:398 Failed to reload tavofirewall"},
-            DeployLog());
+            TaggedLogMessages("nginx_deploy"));
   EXPECT_EQ(1u, FakeCalls("tavofirewall").size());
   EXPECT_TRUE(ChainIsGone());
 }
@@ -143,7 +144,7 @@ TEST(NginxFwStrategy, IptablesFailuresAreLoggedAndReported) {
     } else {
       EXPECT_EQ(c.result, FwStrategyZAMDefault().ApplyFirewallStrategy());
     }
-    EXPECT_EQ(c.log, DeployLog());
+    EXPECT_EQ(c.log, TaggedLogMessages("nginx_deploy"));
     FailIptablesRunsStartingWith("");
     EXPECT_EQ(c.chain_gone, ChainIsGone());
     EXPECT_EQ(0u, CountRules(kRule));

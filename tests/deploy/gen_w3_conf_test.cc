@@ -1,26 +1,23 @@
 #include <tavow3/gen_w3_conf.h>
 #include <tavow3/nginx_conf_policy.h>
 
-#include <fcntl.h>
 #include <sys/file.h>
-#include <unistd.h>
 
 #include <string>
 
 #include <gtest/gtest.h>
 
-#include "deploy_test_util.h"
+#include "deploy_fixtures.h"
+#include "support/test_files.h"
+#include "support/test_process.h"
 
 namespace tavow3::test {
 namespace {
 
-bool GenerationLockIsFree() {
-  const int fd = ::open("/run/lock/nginx_gen.lock", O_RDONLY | O_CLOEXEC);
-  if (fd < 0) return true;  // never created: nobody holds it
-  const bool free = ::flock(fd, LOCK_EX | LOCK_NB) == 0;
-  ::close(fd);
-  return free;
-}
+constexpr char kLockPath[] = "/run/lock/nginx_gen.lock";
+
+// A lock file never created is held by nobody.
+bool GenerationLockIsFree() { return !PathExists(kLockPath) || CanFlock(kLockPath, LOCK_EX); }
 
 TEST(GenW3Conf, GeneratesUnderTheLockOnlyWhenFirewallAndCertificatesAreOk) {
   const struct {
@@ -40,8 +37,8 @@ TEST(GenW3Conf, GeneratesUnderTheLockOnlyWhenFirewallAndCertificatesAreOk) {
     // store's directory goes, break the two steps.
     RemoveTree("/usr/tavo/etc/services.d/tavow3.sc");
     RemoveTree("/usr/tavo/etc/tls");
-    if (!c.firewall_ok) WriteFileAt("/usr/tavo/etc/services.d/tavow3.sc/in-the-way", "");
-    if (!c.certificate_ok) WriteFileAt("/usr/tavo/etc/tls", "");
+    if (!c.firewall_ok) WriteBytes("/usr/tavo/etc/services.d/tavow3.sc/in-the-way", "");
+    if (!c.certificate_ok) WriteBytes("/usr/tavo/etc/tls", "");
     const int runs = GeneratorRuns();
     {
       GenW3Conf generation;
@@ -69,7 +66,7 @@ TEST(NginxConfPolicyWithGenConf, GeneratesBeforeDeployingAndHoldsTheLockToTheEnd
     NginxConfPolicyWithGenConf policy(NGINXCONF_NORMAL);
     EXPECT_EQ(1, GeneratorRuns());
     // The generated main configuration was there for the deployer to install.
-    EXPECT_EQ(MainConf("generated"), FileBytes("/etc/nginx/nginx.conf"));
+    EXPECT_EQ(MainConf("generated"), ReadBytes("/etc/nginx/nginx.conf"));
     EXPECT_TRUE(policy.IsConfValid()) << policy.GetNginxTestMsg();
     EXPECT_TRUE(policy.ApplyConfPolicy(NGINXCONF_DEFAULT));
     EXPECT_FALSE(GenerationLockIsFree());

@@ -11,8 +11,10 @@
 #include <gtest/gtest.h>
 
 #include "base/fault.h"
-#include "deploy_test_util.h"
+#include "deploy_fixtures.h"
 #include "support/syslog_capture.h"
+#include "support/test_files.h"
+#include "support/test_process.h"
 
 namespace tavow3::test {
 namespace {
@@ -25,11 +27,6 @@ constexpr char kLink[] = "/tmp/links/link";
 
 void Symlink(const std::string& target, const std::string& link) {
   ASSERT_EQ(0, ::symlink(target.c_str(), link.c_str())) << link;
-}
-
-mode_t ModeOf(const std::string& path) {
-  struct stat st;
-  return ::lstat(path.c_str(), &st) == 0 ? st.st_mode & 07777 : 0;
 }
 
 TEST(MakeLink, ArrangesTheLinkWhateverStandsAtItsPath) {
@@ -46,29 +43,29 @@ TEST(MakeLink, ArrangesTheLinkWhateverStandsAtItsPath) {
       {"link with a trailing slash", [] { Symlink(std::string(kTarget) + "/", kLink); }, 0, "",
        false},
       {"dangling link", [] { Symlink("/nonexistent", kLink); }, 0, "", false},
-      {"real directory", [] { WriteFileAt(std::string(kLink) + "/site.conf", "dir\n"); }, 1,
+      {"real directory", [] { WriteBytes(std::string(kLink) + "/site.conf", "dir\n"); }, 1,
        "/site.conf", false},
-      {"regular file", [] { WriteFileAt(kLink, "file\n"); }, 1, "", false},
+      {"regular file", [] { WriteBytes(kLink, "file\n"); }, 1, "", false},
   };
   for (const auto& c : cases) {
     SCOPED_TRACE(c.name);
     RemoveTree("/tmp/links");
-    WriteFileAt(std::string(kTarget) + "/keep.conf", "keep\n");
+    WriteBytes(std::string(kTarget) + "/keep.conf", "keep\n");
     c.before();
     const ino_t inode_before = InodeOf(kLink);
     ClearLog();
 
     EXPECT_TRUE(MakeLink(kTarget, kLink));
     EXPECT_EQ(kTarget, LinkTarget(kLink));
-    EXPECT_EQ("keep\n", FileBytes(std::string(kLink) + "/keep.conf"));
+    EXPECT_EQ("keep\n", ReadBytes(std::string(kLink) + "/keep.conf"));
     EXPECT_EQ(c.same_inode, InodeOf(kLink) == inode_before);
     const std::vector<std::string> backups = BackupsOf(kLink);
     ASSERT_EQ(c.backups, backups.size());
     if (c.backups == 1) {
       EXPECT_EQ(std::string(c.name) == "real directory" ? "dir\n" : "file\n",
-                FileBytes(backups[0] + c.saved));
+                ReadBytes(backups[0] + c.saved));
     }
-    EXPECT_TRUE(DeployLog().empty());
+    EXPECT_TRUE(TaggedLogMessages("nginx_deploy").empty());
   }
 }
 
@@ -81,13 +78,13 @@ TEST(MakeLink, MakesOrReplacesTheTargetDirectory) {
     bool file_kept;    // /tmp/links/file still there
   } cases[] = {
       {"missing with its parents", [] {}, 0, false},
-      {"regular file", [&] { WriteFileAt(target, "file\n"); }, 1, false},
+      {"regular file", [&] { WriteBytes(target, "file\n"); }, 1, false},
       {"link to a file", [&] {
-         WriteFileAt("/tmp/links/file", "file\n");
-         ASSERT_EQ(0, RunProgram({"/bin/mkdir", "-p", "/tmp/links/a/b"}));
+         WriteBytes("/tmp/links/file", "file\n");
+         MustRun({"/bin/mkdir", "-p", "/tmp/links/a/b"});
          Symlink("/tmp/links/file", target);
        }, 0, true},
-      {"directory", [&] { WriteFileAt(target + "/keep.conf", "keep\n"); }, 0, false},
+      {"directory", [&] { WriteBytes(target + "/keep.conf", "keep\n"); }, 0, false},
   };
   for (const auto& c : cases) {
     SCOPED_TRACE(c.name);
@@ -100,17 +97,17 @@ TEST(MakeLink, MakesOrReplacesTheTargetDirectory) {
     EXPECT_EQ(target, LinkTarget(kLink));
     EXPECT_EQ(0755u, ModeOf("/tmp/links/a"));
     if (std::string(c.name) == "directory") {
-      EXPECT_EQ("keep\n", FileBytes(target + "/keep.conf"));
+      EXPECT_EQ("keep\n", ReadBytes(target + "/keep.conf"));
     } else {
       EXPECT_EQ(0755u, ModeOf(target));
     }
     const std::vector<std::string> backups = BackupsOf(target);
     ASSERT_EQ(c.backups, backups.size());
     if (c.backups == 1) {
-      EXPECT_EQ("file\n", FileBytes(backups[0]));
+      EXPECT_EQ("file\n", ReadBytes(backups[0]));
     }
-    EXPECT_EQ(c.file_kept, FileBytes("/tmp/links/file") == "file\n");
-    EXPECT_TRUE(DeployLog().empty());
+    EXPECT_EQ(c.file_kept, ReadBytes("/tmp/links/file") == "file\n");
+    EXPECT_TRUE(TaggedLogMessages("nginx_deploy").empty());
   }
 }
 
@@ -118,15 +115,16 @@ TEST(MakeLink, RefusesBadArgumentsAndUnmakeableTargets) {
   ClearLog();
   EXPECT_FALSE(MakeLink("", kLink));
   EXPECT_FALSE(MakeLink(kTarget, ""));
-  EXPECT_EQ(std::vector<std::string>(2, "nginx_deploy:500 Bad parameter!"), DeployLog());
+  EXPECT_EQ(std::vector<std::string>(2, "nginx_deploy:500 Bad parameter!"),
+            TaggedLogMessages("nginx_deploy"));
 
   RemoveTree("/tmp/links");
-  WriteFileAt("/tmp/links/plain", "plain\n");
+  WriteBytes("/tmp/links/plain", "plain\n");
   ClearLog();
   EXPECT_FALSE(MakeLink("/tmp/links/plain/sub", kLink));
   EXPECT_EQ(std::vector<std::string>{"nginx_deploy:514 TAVOFSMkdirP failed "
                                      "(/tmp/links/plain/sub, Not a directory)"},
-            DeployLog());
+            TaggedLogMessages("nginx_deploy"));
   EXPECT_FALSE(PathExists(kLink));
 }
 
@@ -136,7 +134,7 @@ TEST(MakeLink, FailedSymlinkIsLoggedButReportedAsSuccess) {
   EXPECT_TRUE(MakeLink(kTarget, "/tmp/links/missing/link"));
   EXPECT_EQ(std::vector<std::string>{"nginx_deploy:533 Cannot make link from /tmp/links/target "
                                      "to /tmp/links/missing/link, No such file or directory"},
-            DeployLog());
+            TaggedLogMessages("nginx_deploy"));
   EXPECT_TRUE(IsDirectory(kTarget));
 }
 
@@ -162,31 +160,31 @@ TEST(RemovePath, BacksUpOrDeletesAndLogsEachFailure) {
   for (const auto& c : cases) {
     SCOPED_TRACE(c.name);
     RemoveTree("/tmp/links");
-    WriteFileAt(c.directory ? std::string(kLink) + "/f" : std::string(kLink), "x\n");
+    WriteBytes(c.directory ? std::string(kLink) + "/f" : std::string(kLink), "x\n");
     ClearLog();
     {
       base::fault::Arm arm(c.nth, base::fault::kOnce, EIO, c.failing);
       EXPECT_EQ(c.result, RemovePath(kLink));
       EXPECT_TRUE(arm.fired());
     }
-    EXPECT_EQ(c.log, DeployLog());
+    EXPECT_EQ(c.log, TaggedLogMessages("nginx_deploy"));
     EXPECT_EQ(c.still_there, PathExists(kLink));
     EXPECT_TRUE(BackupsOf(kLink).empty());  // no stray placeholder either
   }
 
   // On a read-only file system neither the backup nor the deletion works.
   RemoveTree("/tmp/links");
-  WriteFileAt("/tmp/links/ro/file", "x\n");
-  ASSERT_EQ(0, RunProgram({"/bin/mount", "--bind", "/tmp/links/ro", "/tmp/links/ro"}));
-  ASSERT_EQ(0, RunProgram({"/bin/mount", "-o", "remount,bind,ro", "/tmp/links/ro"}));
+  WriteBytes("/tmp/links/ro/file", "x\n");
+  MustRun({"/bin/mount", "--bind", "/tmp/links/ro", "/tmp/links/ro"});
+  MustRun({"/bin/mount", "-o", "remount,bind,ro", "/tmp/links/ro"});
   ClearLog();
   EXPECT_FALSE(RemovePath("/tmp/links/ro/file"));
   EXPECT_EQ((std::vector<std::string>{
                 "nginx_deploy:483 failed to backup /tmp/links/ro/file, Read-only file system",
                 "nginx_deploy:485 failed to delete /tmp/links/ro/file, Read-only file system"}),
-            DeployLog());
-  EXPECT_EQ("x\n", FileBytes("/tmp/links/ro/file"));
-  ASSERT_EQ(0, RunProgram({"/bin/umount", "/tmp/links/ro"}));
+            TaggedLogMessages("nginx_deploy"));
+  EXPECT_EQ("x\n", ReadBytes("/tmp/links/ro/file"));
+  MustRun({"/bin/umount", "/tmp/links/ro"});
 
   RemoveTree("/tmp/links");
   ASSERT_EQ(0, ::mkdir("/tmp/links", 0755));
@@ -198,7 +196,7 @@ TEST(RemovePath, BacksUpOrDeletesAndLogsEachFailure) {
   }
   EXPECT_EQ(std::vector<std::string>{"nginx_deploy:471 Cannot delete link /tmp/links/link, "
                                      "Operation not permitted"},
-            DeployLog());
+            TaggedLogMessages("nginx_deploy"));
   EXPECT_EQ(kTarget, LinkTarget(kLink));
 }
 
@@ -209,13 +207,13 @@ TEST(RemovePath, TooLongBackupNameFallsBackToDeleting) {
   while (deep.size() + 201 < 1020) deep += "/" + std::string(200, 'd');
   deep += "/" + std::string(1020 - deep.size() - 1, 'f');
   ASSERT_EQ(1020u, deep.size());
-  WriteFileAt(deep, "x\n");
+  WriteBytes(deep, "x\n");
   ClearLog();
   EXPECT_TRUE(RemovePath(deep));
   EXPECT_FALSE(PathExists(deep));
   EXPECT_EQ(std::vector<std::string>{"nginx_deploy:483 failed to backup " + deep +
                                      ", File name too long"},
-            DeployLog());
+            TaggedLogMessages("nginx_deploy"));
 }
 
 }  // namespace

@@ -17,7 +17,9 @@
 #include <gtest/gtest.h>
 
 #include "base/fault.h"
-#include "deploy_test_util.h"
+#include "deploy_fixtures.h"
+#include "support/test_files.h"
+#include "support/test_process.h"
 
 namespace tavow3::test {
 namespace {
@@ -25,26 +27,7 @@ namespace {
 constexpr char kLockPath[] = "/run/lock/nginx_gen.lock";
 
 // Whether a second open file description of the lock file gets the lock now.
-bool LockIsFree() {
-  const int fd = ::open(kLockPath, O_RDONLY | O_CLOEXEC);
-  if (fd < 0) return false;
-  const bool free = ::flock(fd, LOCK_EX | LOCK_NB) == 0;
-  ::close(fd);
-  return free;
-}
-
-// True when /proc/locks shows `pid` waiting for an flock.
-bool IsWaitingForFlock(pid_t pid) {
-  std::istringstream locks(FileBytes("/proc/locks"));
-  for (std::string line; std::getline(locks, line);) {
-    std::istringstream fields(line);
-    std::string index, arrow, kind, advisory, access;
-    pid_t owner = 0;
-    fields >> index >> arrow >> kind >> advisory >> access >> owner;
-    if (arrow == "->" && kind == "FLOCK" && owner == pid) return true;
-  }
-  return false;
-}
+bool LockIsFree() { return CanFlock(kLockPath, LOCK_EX); }
 
 // Reads one byte from `fd`, waiting at most `timeout_ms`; 0 when none came.
 char ReadByte(int fd, int timeout_ms) {
@@ -64,7 +47,7 @@ TEST(GenerationLock, OpensTheLockFileCloseOnExecAndLocksOnlyWhenAsked) {
     std::string flags;
     for (int fd = 3; fd < 256 && flags.empty(); ++fd) {
       if (LinkTarget("/proc/self/fd/" + std::to_string(fd)) != kLockPath) continue;
-      std::istringstream info(FileBytes("/proc/self/fdinfo/" + std::to_string(fd)));
+      std::istringstream info(ReadBytes("/proc/self/fdinfo/" + std::to_string(fd)));
       for (std::string key; info >> key;) {
         if (key == "flags:") info >> flags;
       }

@@ -16,9 +16,10 @@
 
 #include "base/fault.h"
 #include "deploy/alert_delay.h"
-#include "deploy_test_util.h"
 #include "support/fake_tools.h"
 #include "support/syslog_capture.h"
+#include "support/test_files.h"
+#include "support/test_process.h"
 
 namespace tavow3::test {
 namespace {
@@ -53,7 +54,7 @@ int ReapAlertProcesses() {
 void WriteRecord(const char* text) {
   std::string bytes(4096, '\0');
   bytes.replace(0, std::string(text).size(), text);
-  WriteFileAt("/dev/shm/nginx_mod", bytes);
+  WriteBytes("/dev/shm/nginx_mod", bytes);
 }
 
 TEST(EmitAlert, DefaultNotifiesAtOnceWithoutForking) {
@@ -65,7 +66,7 @@ TEST(EmitAlert, DefaultNotifiesAtOnceWithoutForking) {
   EXPECT_EQ(2u, Alerts());
   EXPECT_FALSE(no_fork.fired());
   // Asked directly, Default notifies even while the flag exists.
-  WriteFileAt(kFlag, "");
+  WriteBytes(kFlag, "");
   NginxModeRecorder::EmitAlert(NGINXCONF_DEFAULT);
   EXPECT_EQ(3u, Alerts());
 }
@@ -92,7 +93,7 @@ TEST(EmitAlert, DelayedAlertLooksAtTheRecordAndTheFlagAgain) {
     ::unlink("/dev/shm/nginx_mod");
     if (c.record != nullptr) WriteRecord(c.record);
     ::unlink(kFlag);
-    if (c.flag) WriteFileAt(kFlag, "");
+    if (c.flag) WriteBytes(kFlag, "");
     NginxModeRecorder::EmitAlert(NGINXCONF_ABNORMAL);
     EXPECT_EQ(1, ReapAlertProcesses());
     EXPECT_EQ(c.alerts, Alerts());
@@ -111,7 +112,7 @@ TEST(EmitAlert, RecordingAFallBackAlertsAfterTheDelayUnlessForced) {
 
   // Normal raises nothing; with the flag no alert process is even started.
   EXPECT_TRUE(NginxModeRecorder::RecordMode(NGINXCONF_NORMAL));
-  WriteFileAt(kFlag, "");
+  WriteBytes(kFlag, "");
   EXPECT_TRUE(NginxModeRecorder::RecordMode(NGINXCONF_ABNORMAL));
   EXPECT_TRUE(NginxModeRecorder::RecordMode(NGINXCONF_DEFAULT));
   EXPECT_EQ(0, ReapAlertProcesses());
@@ -147,7 +148,7 @@ TEST(EmitAlert, FailedForksAlertAtOnce) {
     }
     // Sent before EmitAlert returned: by this process or by the waited-for child.
     EXPECT_EQ(std::vector<std::vector<std::string>>{kAlert}, FakeCalls("tavozamnotify"));
-    EXPECT_EQ(std::vector<std::string>{c.log}, DeployLog());
+    EXPECT_EQ(std::vector<std::string>{c.log}, TaggedLogMessages("nginx_deploy"));
   }
   EXPECT_TRUE(ChildrenInState(0).empty());
 }

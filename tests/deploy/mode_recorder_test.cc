@@ -12,8 +12,8 @@
 #include <gtest/gtest.h>
 
 #include "base/fault.h"
-#include "deploy_test_util.h"
 #include "support/syslog_capture.h"
+#include "support/test_files.h"
 
 namespace tavow3::test {
 namespace {
@@ -37,7 +37,7 @@ int ModeInChild() {
 }
 
 // Alerts would fork: the flag keeps RecordMode from raising them here.
-void SuppressAlerts() { WriteFileAt("/run/tavow3/force_default", ""); }
+void SuppressAlerts() { WriteBytes("/run/tavow3/force_default", ""); }
 
 TEST(NginxModeRecorder, RecordIsTheModeAsTextInA4096ByteObjectReadByAnotherProcess) {
   SuppressAlerts();
@@ -56,7 +56,7 @@ TEST(NginxModeRecorder, RecordIsTheModeAsTextInA4096ByteObjectReadByAnotherProce
   for (const auto& c : cases) {
     SCOPED_TRACE(c.text);
     EXPECT_TRUE(NginxModeRecorder::RecordMode(c.mode));
-    EXPECT_EQ(Record(c.text), FileBytes(kShmFile));
+    EXPECT_EQ(Record(c.text), ReadBytes(kShmFile));
     struct stat st;
     ASSERT_EQ(0, ::stat(kShmFile, &st));
     EXPECT_EQ(0644u, st.st_mode & 07777);
@@ -90,10 +90,10 @@ TEST(NginxModeRecorder, RejectedRecordsReadAsMinusOne) {
   for (const auto& c : cases) {
     SCOPED_TRACE(c.name);
     ::unlink(kShmFile);
-    if (!c.bytes.empty()) WriteFileAt(kShmFile, c.bytes);
+    if (!c.bytes.empty()) WriteBytes(kShmFile, c.bytes);
     ClearLog();
     EXPECT_EQ(c.mode, NginxModeRecorder::GetMode());
-    EXPECT_EQ(c.log, DeployLog());
+    EXPECT_EQ(c.log, TaggedLogMessages("nginx_deploy"));
   }
 }
 
@@ -114,10 +114,10 @@ TEST(NginxModeRecorder, ObjectShorterThanARecordReadsAsPadded) {
   };
   for (const auto& c : cases) {
     SCOPED_TRACE(c.bytes.size());
-    WriteFileAt(kShmFile, c.bytes);
+    WriteBytes(kShmFile, c.bytes);
     ClearLog();
     EXPECT_EQ(c.mode, NginxModeRecorder::GetMode());
-    EXPECT_EQ(c.log, DeployLog());
+    EXPECT_EQ(c.log, TaggedLogMessages("nginx_deploy"));
   }
 }
 
@@ -125,7 +125,8 @@ TEST(NginxModeRecorder, RecordingNoneWritesNothing) {
   ClearLog();
   EXPECT_TRUE(NginxModeRecorder::RecordMode(NGINXCONF_NONE));
   EXPECT_FALSE(PathExists(kShmFile));
-  EXPECT_EQ(std::vector<std::string>{"nginx_deploy:719 Bad nginx mode to record"}, DeployLog());
+  EXPECT_EQ(std::vector<std::string>{"nginx_deploy:719 Bad nginx mode to record"},
+            TaggedLogMessages("nginx_deploy"));
   EXPECT_EQ(-1, NginxModeRecorder::GetMode());
 }
 
@@ -153,8 +154,8 @@ TEST(NginxModeRecorder, FailuresAreLoggedAndStillReportSuccess) {
       EXPECT_TRUE(NginxModeRecorder::RecordMode(NGINXCONF_NORMAL));
       EXPECT_TRUE(arm.fired());
     }
-    EXPECT_EQ(c.bytes_after, FileBytes(kShmFile));
-    EXPECT_EQ(c.log, DeployLog());
+    EXPECT_EQ(c.bytes_after, ReadBytes(kShmFile));
+    EXPECT_EQ(c.log, TaggedLogMessages("nginx_deploy"));
   }
 }
 
@@ -166,7 +167,7 @@ TEST(NginxModeRecorder, ReadFailuresGiveMinusOneOrKeepTheMode) {
     base::fault::Arm arm(1, base::fault::kOnce, ENOMEM, Op::kMmap);
     EXPECT_EQ(-1, NginxModeRecorder::GetMode());
     EXPECT_TRUE(arm.fired());
-    EXPECT_TRUE(DeployLog().empty());
+    EXPECT_TRUE(TaggedLogMessages("nginx_deploy").empty());
   }
   {
     ClearLog();
@@ -175,7 +176,7 @@ TEST(NginxModeRecorder, ReadFailuresGiveMinusOneOrKeepTheMode) {
     EXPECT_TRUE(arm.fired());
     EXPECT_EQ(std::vector<std::string>{"nginx_deploy:671 Failed to close share memory, "
                                        "Input/output error"},
-              DeployLog());
+              TaggedLogMessages("nginx_deploy"));
   }
 }
 

@@ -9,9 +9,11 @@
 
 #include <gtest/gtest.h>
 
-#include "deploy_test_util.h"
+#include "deploy_fixtures.h"
 #include "support/fake_tools.h"
 #include "support/syslog_capture.h"
+#include "support/test_files.h"
+#include "support/test_process.h"
 
 namespace tavow3::test {
 namespace {
@@ -22,8 +24,8 @@ constexpr char kConfD[] = "/etc/nginx/conf.d";
 // The packaged directories under /etc/nginx are replaced by links; they are
 // removed here because the sandbox's overlay cannot rename them (EXDEV).
 void PrepareGeneratedTree() {
-  WriteFileAt("/var/tmp/nginx/nginx.conf", MainConf("generated"));
-  WriteFileAt("/var/tmp/nginx/app.d/app.conf", "server { listen 127.0.0.1:8083; }\n");
+  WriteBytes("/var/tmp/nginx/nginx.conf", MainConf("generated"));
+  WriteBytes("/var/tmp/nginx/app.d/app.conf", "server { listen 127.0.0.1:8083; }\n");
   for (const char* path : {kAppD, kConfD, "/etc/nginx/sites-enabled"}) RemoveTree(path);
 }
 
@@ -35,14 +37,16 @@ TEST(NginxConfPolicy, UnknownModesLeaveNoDeployer) {
   EXPECT_EQ("", made.GetNginxModeString());
   EXPECT_FALSE(made.IsConfValid());
   EXPECT_FALSE(made.ApplyFirewallStrategy());
-  EXPECT_EQ(std::vector<std::string>{"nginx_deploy:300 Cannot find nginx policy 3"}, DeployLog());
+  EXPECT_EQ(std::vector<std::string>{"nginx_deploy:300 Cannot find nginx policy 3"},
+            TaggedLogMessages("nginx_deploy"));
 
   NginxConfPolicy policy;
   EXPECT_EQ(NGINXCONF_NONE, policy.GetConfPolicy());
   ASSERT_TRUE(policy.ApplyConfPolicy(NGINXCONF_DEFAULT));
   ClearLog();
   EXPECT_FALSE(policy.ApplyConfPolicy(static_cast<NGINXCONF_TYPE>(3)));
-  EXPECT_EQ(std::vector<std::string>{"nginx_deploy:333 Cannot find nginx policy 3"}, DeployLog());
+  EXPECT_EQ(std::vector<std::string>{"nginx_deploy:333 Cannot find nginx policy 3"},
+            TaggedLogMessages("nginx_deploy"));
   EXPECT_EQ(NGINXCONF_NONE, policy.GetConfPolicy());
   EXPECT_EQ("", policy.GetNginxModeString());
   EXPECT_EQ("", policy.GetNginxTestMsg());
@@ -51,7 +55,7 @@ TEST(NginxConfPolicy, UnknownModesLeaveNoDeployer) {
   ClearLog();
   EXPECT_FALSE(policy.ApplyConfPolicy(NGINXCONF_NONE));
   EXPECT_EQ(NGINXCONF_NONE, policy.GetConfPolicy());
-  EXPECT_TRUE(DeployLog().empty());
+  EXPECT_TRUE(TaggedLogMessages("nginx_deploy").empty());
   // Nothing was deployed by any of it.
   EXPECT_FALSE(PathExists(kAppD));
   EXPECT_TRUE(PathExists("/var/tmp/nginx/nginx.conf"));
@@ -70,7 +74,7 @@ TEST(NginxConfPolicy, ConstructionDeploysWithoutTesting) {
 
 TEST(NginxConfPolicy, DefaultAfterNormalKeepsTheFilesAndTakesTheDefaultFirewall) {
   PrepareGeneratedTree();
-  WriteFileAt("/usr/local/etc/nginx/conf.d/broken.conf", "bogus_directive on;\n");
+  WriteBytes("/usr/local/etc/nginx/conf.d/broken.conf", "bogus_directive on;\n");
   NginxConfPolicy policy;
   EXPECT_FALSE(policy.ApplyConfPolicy(NGINXCONF_NORMAL));
   EXPECT_TRUE(policy.GetNginxTestMsg().find("bogus_directive") != std::string::npos);
@@ -100,7 +104,7 @@ TEST(NginxConfPolicy, DefaultAfterNormalKeepsTheFilesAndTakesTheDefaultFirewall)
 }
 
 TEST(NginxConfPolicy, RecordsItsMode) {
-  WriteFileAt("/run/tavow3/force_default", "");  // no alert process here
+  WriteBytes("/run/tavow3/force_default", "");  // no alert process here
   for (NGINXCONF_TYPE mode : {NGINXCONF_DEFAULT, NGINXCONF_NORMAL}) {
     SCOPED_TRACE(mode);
     NginxConfPolicy policy;
@@ -115,7 +119,8 @@ TEST(NginxConfPolicy, RecordsItsMode) {
   ClearLog();
   NginxConfPolicy none;
   EXPECT_TRUE(none.RecordNginxMode());
-  EXPECT_EQ(std::vector<std::string>{"nginx_deploy:719 Bad nginx mode to record"}, DeployLog());
+  EXPECT_EQ(std::vector<std::string>{"nginx_deploy:719 Bad nginx mode to record"},
+            TaggedLogMessages("nginx_deploy"));
   EXPECT_EQ(NGINXCONF_NORMAL, NginxModeRecorder::GetMode());
 }
 
