@@ -10,9 +10,11 @@
 #include <gtest/gtest.h>
 
 #include "base/fault.h"
-#include "manager_test_util.h"
+#include "manager_fixtures.h"
 #include "support/fake_tools.h"
 #include "support/syslog_capture.h"
+#include "support/test_files.h"
+#include "support/test_process.h"
 
 namespace tavow3::test {
 namespace {
@@ -26,7 +28,7 @@ namespace fault = base::fault;
 void DeployNormal() {
   NginxConfManager init(NGINXCONF_DEPLOY_INIT);
   ASSERT_EQ(0, init.run()) << init.GetMsg();
-  WriteFileAt(kForceDefaultFlag, "");
+  WriteBytes(kForceDefaultFlag, "");
   ClearFakeCalls("tavofirewall");
 }
 
@@ -39,7 +41,7 @@ struct Snapshot {
 };
 
 Snapshot Take() {
-  return {FileBytes(kMainConf), LinkTarget("/etc/nginx/conf.d"),
+  return {ReadBytes(kMainConf), LinkTarget("/etc/nginx/conf.d"),
           LinkTarget("/etc/nginx/sites-enabled"), LinkTarget("/etc/nginx/app.d"),
           ModeRecordText()};
 }
@@ -68,7 +70,7 @@ TEST(DeployNginxHup, ChangesNothingUnlessTheJobRunsInNormalOrAbnormal) {
       {"Default", "self", "2", 2, {"nginx_deploy:907 nginx job is run in default mode"}, LOG_INFO},
   };
   // A broken fragment would switch to Abnormal if anything were deployed.
-  WriteFileAt("/usr/local/etc/nginx/conf.d/broken.conf", "bogus_directive on;\n");
+  WriteBytes("/usr/local/etc/nginx/conf.d/broken.conf", "bogus_directive on;\n");
   for (const RefusalCase& c : cases) {
     SCOPED_TRACE(c.name);
     RemoveTree("/run/nginx.pid");
@@ -78,7 +80,7 @@ TEST(DeployNginxHup, ChangesNothingUnlessTheJobRunsInNormalOrAbnormal) {
     } else if (pid_file == "dir") {
       ASSERT_EQ(0, RunCommand({"/bin/mkdir", "/run/nginx.pid"}).status);
     } else if (!pid_file.empty()) {
-      WriteFileAt("/run/nginx.pid", pid_file);
+      WriteBytes("/run/nginx.pid", pid_file);
     }
     ASSERT_EQ(0, RunCommand({"/bin/rm", "-f", "/dev/shm/nginx_mod"}).status);
     if (c.record != nullptr) WriteModeRecord(c.record);
@@ -87,8 +89,8 @@ TEST(DeployNginxHup, ChangesNothingUnlessTheJobRunsInNormalOrAbnormal) {
     NginxConfManager manager(NGINXCONF_DEPLOY_HUP);
     EXPECT_EQ(c.result, manager.run());
     EXPECT_EQ("", manager.GetMsg());
-    EXPECT_EQ(c.log, DeployLog());
-    EXPECT_EQ(c.log.back(), DeployLog(c.priority).back());
+    EXPECT_EQ(c.log, TaggedLogMessages("nginx_deploy"));
+    EXPECT_EQ(c.log.back(), TaggedLogMessages("nginx_deploy", c.priority).back());
     EXPECT_TRUE(before == Take());
   }
   EXPECT_TRUE(FakeCalls("tavofirewall").empty());
@@ -106,16 +108,16 @@ TEST(DeployNginxHup, KeepsNormalAndSwitchesABrokenConfigurationToAbnormal) {
     EXPECT_EQ("Start Nginx Server in Normal Mode ......\n", manager.GetMsg());
     EXPECT_EQ("0", ModeRecordText());
     EXPECT_EQ("/usr/local/etc/nginx/conf.d", LinkTarget("/etc/nginx/conf.d"));
-    EXPECT_TRUE(DeployLog().empty());
+    EXPECT_TRUE(TaggedLogMessages("nginx_deploy").empty());
   }
 
-  WriteFileAt("/usr/local/etc/nginx/conf.d/broken.conf", "bogus_directive on;\n");
+  WriteBytes("/usr/local/etc/nginx/conf.d/broken.conf", "bogus_directive on;\n");
   ClearLog();
   NginxConfManager manager(NGINXCONF_DEPLOY_HUP);
   EXPECT_EQ(1, manager.run());
   EXPECT_EQ("Start Nginx Server in Abnormal Mode ......\n", manager.GetMsg());
   EXPECT_EQ(Lines{"nginx_deploy:915 Nginx config has problem, change to abnormal mode"},
-            DeployLog());
+            TaggedLogMessages("nginx_deploy"));
   EXPECT_EQ("1", ModeRecordText());
   EXPECT_FALSE(PathExists("/etc/nginx/conf.d"));
   EXPECT_FALSE(PathExists("/etc/nginx/sites-enabled"));
@@ -137,7 +139,7 @@ TEST(DeployNginxHup, FailsWithoutTheGenerationLock) {
   DeployNormal();
   PretendNginxRuns();
   WriteModeRecord("0");
-  WriteFileAt("/usr/local/etc/nginx/conf.d/broken.conf", "bogus_directive on;\n");
+  WriteBytes("/usr/local/etc/nginx/conf.d/broken.conf", "bogus_directive on;\n");
   const Snapshot before = Take();
   ClearLog();
   {
@@ -147,7 +149,7 @@ TEST(DeployNginxHup, FailsWithoutTheGenerationLock) {
     EXPECT_TRUE(arm.fired());
     EXPECT_EQ("", manager.GetMsg());
   }
-  EXPECT_EQ(Lines{"nginx_deploy:918 Failed to get genente nginx config lock."}, DeployLog());
+  EXPECT_EQ(Lines{"nginx_deploy:918 Failed to get genente nginx config lock."}, TaggedLogMessages("nginx_deploy"));
   EXPECT_TRUE(before == Take());
 }
 

@@ -12,9 +12,11 @@
 
 #include <gtest/gtest.h>
 
-#include "manager_test_util.h"
+#include "manager_fixtures.h"
 #include "support/fake_tools.h"
 #include "support/syslog_capture.h"
+#include "support/test_files.h"
+#include "support/test_process.h"
 
 namespace tavow3::test {
 namespace {
@@ -34,7 +36,7 @@ TEST(NginxConfManager, UnknownOperatorIsLoggedOnceAndEveryCallFails) {
     EXPECT_EQ(-1, manager.run_with_args({"192.0.2.1"}));
     EXPECT_EQ(-1, manager.run_with_args({}));
     EXPECT_EQ("", manager.GetMsg());
-    EXPECT_EQ(Lines{"nginx_deploy:800 bad parrameter"}, DeployLog(LOG_ERR));
+    EXPECT_EQ(Lines{"nginx_deploy:800 bad parrameter"}, TaggedLogMessages("nginx_deploy", LOG_ERR));
   }
   EXPECT_FALSE(PathExists(kVantoroList));
 }
@@ -52,7 +54,7 @@ TEST(NginxConfManager, RunWithArgsRefusesEveryOperatorWithoutArgumentsAndRunsNot
       {6, "29NginxConfOperatorForceDefault"},    {7, "32NginxConfOperatorIsForcedDefault"},
       {9, "34NginxConfOperatorClearVantoroProxy"}, {10, "33NginxConfOperatorListVantoroProxy"},
   };
-  WriteFileAt(kVantoroList, "set_real_ip_from 192.0.2.1;\n");
+  WriteBytes(kVantoroList, "set_real_ip_from 192.0.2.1;\n");
   PretendNginxRuns();
   for (const RefusalCase& c : cases) {
     for (const Lines& args : {Lines{}, Lines{"192.0.2.7"}}) {
@@ -63,14 +65,14 @@ TEST(NginxConfManager, RunWithArgsRefusesEveryOperatorWithoutArgumentsAndRunsNot
       EXPECT_EQ("", manager.GetMsg());
       EXPECT_EQ(Lines{std::string("nginx_deploy:826 ") + c.type_name +
                       " not support setting argument."},
-                DeployLog());
+                TaggedLogMessages("nginx_deploy"));
     }
   }
   // None of them ran: no generation, no mode, no flag, no list change, no firewall.
   EXPECT_FALSE(PathExists(kTmpMainConf));
   EXPECT_FALSE(PathExists(kForceDefaultFlag));
   EXPECT_EQ("<none>", ModeRecordText());
-  EXPECT_EQ("set_real_ip_from 192.0.2.1;\n", FileBytes(kVantoroList));
+  EXPECT_EQ("set_real_ip_from 192.0.2.1;\n", ReadBytes(kVantoroList));
   EXPECT_TRUE(FakeCalls("tavofirewall").empty());
   EXPECT_FALSE(HasDefaultRule());
 }
@@ -84,7 +86,7 @@ TEST(NginxConfManager, RunWithArgsPassesArgumentsToTheSetOperator) {
   NginxConfManager manager(NGINXCONF_SET_VANTORO_PROXY);
   EXPECT_EQ(0, manager.run_with_args({"192.0.2.1"}));
   EXPECT_EQ("List of Vantoro servers is set.\n", manager.GetMsg());
-  EXPECT_EQ("set_real_ip_from 192.0.2.1;\n", FileBytes(kVantoroList));
+  EXPECT_EQ("set_real_ip_from 192.0.2.1;\n", ReadBytes(kVantoroList));
 
   // Without arguments the list is empty: the file goes.
   NginxConfManager cleared(NGINXCONF_SET_VANTORO_PROXY);
@@ -158,9 +160,9 @@ TEST(NginxConfManager, ForceDefaultCreatesTheFlagThatIsForcedDefaultReports) {
     NginxConfManager force(NGINXCONF_FORCE_DEFAULT);
     EXPECT_EQ(0, force.run());
     EXPECT_EQ("", force.GetMsg());
-    EXPECT_EQ("", FileBytes(kForceDefaultFlag));
+    EXPECT_EQ("", ReadBytes(kForceDefaultFlag));
   }
-  EXPECT_TRUE(DeployLog().empty());
+  EXPECT_TRUE(TaggedLogMessages("nginx_deploy").empty());
   EXPECT_TRUE(NginxConfOperatorForceDefault().IsForced());
   NginxConfManager after(NGINXCONF_IS_FORCED_DEFAULT);
   EXPECT_EQ(1, after.run());
@@ -169,12 +171,12 @@ TEST(NginxConfManager, ForceDefaultCreatesTheFlagThatIsForcedDefaultReports) {
 
 TEST(NginxConfManager, ForceDefaultFailuresAreLogged) {
   RemoveTree("/run/tavow3");
-  WriteFileAt("/run/tavow3", "not a directory");
+  WriteBytes("/run/tavow3", "not a directory");
   ClearLog();
   NginxConfManager no_dir(NGINXCONF_FORCE_DEFAULT);
   EXPECT_EQ(-1, no_dir.run());
   EXPECT_EQ("", no_dir.GetMsg());
-  EXPECT_EQ(Lines{"nginx_deploy:1041 Faild to mkdir /run/tavow3"}, DeployLog());
+  EXPECT_EQ(Lines{"nginx_deploy:1041 Faild to mkdir /run/tavow3"}, TaggedLogMessages("nginx_deploy"));
 
   // A dangling link where the flag goes: it can be neither created nor seen.
   RemoveTree("/run/tavow3");
@@ -183,7 +185,7 @@ TEST(NginxConfManager, ForceDefaultFailuresAreLogged) {
   ClearLog();
   NginxConfManager no_flag(NGINXCONF_FORCE_DEFAULT);
   EXPECT_EQ(-1, no_flag.run());
-  EXPECT_EQ(Lines{"nginx_deploy:1045 Failed to create force default flag"}, DeployLog());
+  EXPECT_EQ(Lines{"nginx_deploy:1045 Failed to create force default flag"}, TaggedLogMessages("nginx_deploy"));
   EXPECT_FALSE(NginxConfOperatorForceDefault::IsForced());
 }
 

@@ -7,7 +7,10 @@
 
 #include <gtest/gtest.h>
 
-#include "manager_test_util.h"
+#include "manager_fixtures.h"
+#include "support/test_files.h"
+#include "support/test_nginx.h"
+#include "support/test_process.h"
 
 namespace tavow3::test {
 namespace {
@@ -33,16 +36,16 @@ mode_t ModeOf(const std::string& path) {
 TEST(NginxGenerator, WritesEveryFileAtomicallyAndNginxAcceptsThem) {
   const RunResult first = RunCommand({kGeneratorScript});
   ASSERT_EQ(0, first.status) << first.err;
-  EXPECT_EQ(std::vector<std::string>{"tavow3.conf"}, ListDir("/usr/local/etc/nginx/conf.d"));
+  EXPECT_EQ(std::vector<std::string>{"tavow3.conf"}, DirNames("/usr/local/etc/nginx/conf.d"));
   EXPECT_EQ(std::vector<std::string>{"tavow3-www"},
-            ListDir("/usr/local/etc/nginx/sites-enabled"));
-  EXPECT_EQ((std::vector<std::string>{"app.d", "nginx.conf"}), ListDir("/var/tmp/nginx"));
+            DirNames("/usr/local/etc/nginx/sites-enabled"));
+  EXPECT_EQ((std::vector<std::string>{"app.d", "nginx.conf"}), DirNames("/var/tmp/nginx"));
   EXPECT_EQ(0644u, ModeOf(kTmpMainConf));
   EXPECT_EQ(0600u, ModeOf("/usr/tavo/etc/ssl/default/server.key"));
   EXPECT_EQ(0644u, ModeOf("/usr/tavo/etc/ssl/default/server.crt"));
   EXPECT_EQ((std::vector<std::string>{"server.crt", "server.key"}),
-            ListDir("/usr/tavo/etc/ssl/default"));
-  const std::string main_conf = FileBytes(kTmpMainConf);
+            DirNames("/usr/tavo/etc/ssl/default"));
+  const std::string main_conf = ReadBytes(kTmpMainConf);
   for (const char* part : {"listen 5000 default_server;", "listen 5001 ssl default_server;",
                            "pid /run/nginx.pid;", "include /etc/nginx/conf.d/*.conf;",
                            "include /var/tmp/nginx/trusted_proxy/*.conf;"}) {
@@ -56,30 +59,30 @@ TEST(NginxGenerator, WritesEveryFileAtomicallyAndNginxAcceptsThem) {
   EXPECT_NE(std::string::npos, dump.out.find("set_real_ip_from 192.0.2.1;")) << dump.out;
 
   // A second run keeps the certificate.
-  const std::string certificate = FileBytes("/usr/tavo/etc/ssl/default/server.crt");
+  const std::string certificate = ReadBytes("/usr/tavo/etc/ssl/default/server.crt");
   ASSERT_EQ(0, RunCommand({kGeneratorScript}).status);
-  EXPECT_EQ(certificate, FileBytes("/usr/tavo/etc/ssl/default/server.crt"));
+  EXPECT_EQ(certificate, ReadBytes("/usr/tavo/etc/ssl/default/server.crt"));
 }
 
 TEST(NginxGenerator, WritesNothingWhenATemplateOrTheCertificateFails) {
   ASSERT_EQ(0, RunCommand({kGeneratorScript}).status);
-  const std::string site = FileBytes("/usr/local/etc/nginx/sites-enabled/tavow3-www");
-  WriteFileAt("/var/tmp/nginx/nginx.conf", "# kept\n");
+  const std::string site = ReadBytes("/usr/local/etc/nginx/sites-enabled/tavow3-www");
+  WriteBytes("/var/tmp/nginx/nginx.conf", "# kept\n");
 
-  WriteFileAt("/usr/tavo/share/nginx/tavow3-www.mustache", "{{#web_ports}} unclosed\n");
+  WriteBytes("/usr/tavo/share/nginx/tavow3-www.mustache", "{{#web_ports}} unclosed\n");
   RunResult run = RunCommand({kGeneratorScript});
   EXPECT_EQ(1, run.status);
   EXPECT_NE(std::string::npos, run.err.find("tavow3-www.mustache")) << run.err;
-  EXPECT_EQ("# kept\n", FileBytes(kTmpMainConf));
-  EXPECT_EQ(site, FileBytes("/usr/local/etc/nginx/sites-enabled/tavow3-www"));
+  EXPECT_EQ("# kept\n", ReadBytes(kTmpMainConf));
+  EXPECT_EQ(site, ReadBytes("/usr/local/etc/nginx/sites-enabled/tavow3-www"));
 
   RemoveTree("/usr/tavo/etc/ssl/default");
-  WriteFileAt("/usr/tavo/etc/ssl/default", "not a directory");
+  WriteBytes("/usr/tavo/etc/ssl/default", "not a directory");
   run = RunCommand({kGeneratorScript});
   EXPECT_EQ(1, run.status);
   EXPECT_NE(std::string::npos, run.err.find("/usr/tavo/etc/ssl/default")) << run.err;
-  EXPECT_EQ("# kept\n", FileBytes(kTmpMainConf));
-  EXPECT_EQ(site, FileBytes("/usr/local/etc/nginx/sites-enabled/tavow3-www"));
+  EXPECT_EQ("# kept\n", ReadBytes(kTmpMainConf));
+  EXPECT_EQ(site, ReadBytes("/usr/local/etc/nginx/sites-enabled/tavow3-www"));
 
   EXPECT_EQ(2, RunCommand({kGeneratorScript, "--bogus"}).status);
 }
@@ -99,10 +102,10 @@ TEST(NginxService, StartReloadStopWithTheRealServer) {
   EXPECT_EQ(0, Service("start").status);  // already running: nothing happens
   // From here on no start-up decision is made, and the flag keeps the
   // Abnormal alert's delayed process (which would outlive the test) away.
-  WriteFileAt(kForceDefaultFlag, "");
+  WriteBytes(kForceDefaultFlag, "");
 
   // A broken fragment: the reload falls back to Abnormal, without the sites.
-  WriteFileAt(kBrokenFragment, "bogus_directive on;\n");
+  WriteBytes(kBrokenFragment, "bogus_directive on;\n");
   run = Service("reload");
   EXPECT_EQ(0, run.status) << run.err;
   EXPECT_EQ("Start Nginx Server in Abnormal Mode ......\n", run.out);
@@ -128,7 +131,7 @@ TEST(NginxService, StartReloadStopWithTheRealServer) {
 }
 
 TEST(NginxService, BootWithABrokenFragmentServesTheManagementPortsInDefault) {
-  WriteFileAt(kBrokenFragment, "bogus_directive on;\n");
+  WriteBytes(kBrokenFragment, "bogus_directive on;\n");
   RunResult run = Service("start");
   ASSERT_EQ(0, run.status) << run.out << run.err;
   EXPECT_NE(std::string::npos,

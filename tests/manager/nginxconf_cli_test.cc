@@ -4,8 +4,9 @@
 
 #include <gtest/gtest.h>
 
-#include "manager_test_util.h"
+#include "manager_fixtures.h"
 #include "support/syslog_capture.h"
+#include "support/test_process.h"
 
 namespace tavow3::test {
 namespace {
@@ -70,7 +71,7 @@ TEST(Tavow3Nginxconf, HelpNamesEveryOperatorAndUnknownOnesAreLogged) {
   }
   ClearLog();
   EXPECT_EQ(255, RunCommand({kCli, "11"}).status);
-  EXPECT_EQ(std::vector<std::string>{"nginx_deploy:800 bad parrameter"}, DeployLog());
+  EXPECT_EQ(std::vector<std::string>{"nginx_deploy:800 bad parrameter"}, TaggedLogMessages("nginx_deploy"));
 }
 
 }  // namespace

@@ -11,8 +11,9 @@
 #include <gtest/gtest.h>
 
 #include "base/fault.h"
-#include "manager_test_util.h"
 #include "support/syslog_capture.h"
+#include "support/test_files.h"
+#include "support/test_process.h"
 
 namespace tavow3::test {
 namespace {
@@ -82,21 +83,21 @@ TEST(NginxConfOperatorSetVantoroProxy, WritesOneLinePerAddressRootOwnedAndNginxR
     const Outcome set = RunSet(addresses);
     EXPECT_EQ(0, set.result);
     EXPECT_EQ(kSetLine, set.msg);
-    EXPECT_EQ(ListFile(addresses), FileBytes(kList));
+    EXPECT_EQ(ListFile(addresses), ReadBytes(kList));
     struct stat st;
     ASSERT_EQ(0, ::stat(kList, &st));
     EXPECT_EQ(0u, st.st_uid);
     EXPECT_EQ(0u, st.st_gid);
     EXPECT_EQ(0644u, st.st_mode & 07777);
-    EXPECT_EQ(Lines{"vantoro.conf"}, ListDir(kDir));
-    EXPECT_TRUE(DeployLog().empty());
+    EXPECT_EQ(Lines{"vantoro.conf"}, DirNames(kDir));
+    EXPECT_TRUE(TaggedLogMessages("nginx_deploy").empty());
 
     std::string listed;
     for (const std::string& address : addresses) listed += address + "\n";
     EXPECT_EQ(listed, RunPlain(NGINXCONF_LIST_VANTORO_PROXY).msg);
 
     // nginx accepts the file as an http-level include.
-    WriteFileAt("/tmp/realip.conf",
+    WriteBytes("/tmp/realip.conf",
                 "pid /tmp/realip.pid;\nerror_log stderr;\nevents {}\n"
                 "http { include /var/tmp/nginx/trusted_proxy/*.conf; }\n");
     const RunResult test = RunCommand({"/usr/bin/nginx", "-t", "-c", "/tmp/realip.conf"});
@@ -124,15 +125,15 @@ TEST(NginxConfOperatorSetVantoroProxy, RefusesAtTheFirstInvalidArgument) {
       {{"192.0.2.1;"}, "192.0.2.1;"},
       {{"1.2.3.4\n5.6.7.8"}, "1.2.3.4\n5.6.7.8"},
   };
-  WriteFileAt(kList, kOldList);
+  WriteBytes(kList, kOldList);
   for (const auto& [args, bad] : cases) {
     SCOPED_TRACE(bad);
     ClearLog();
     const Outcome set = RunSet(args);
     EXPECT_EQ(-1, set.result);
     EXPECT_EQ(bad + " is an invalid IP\n", set.msg);
-    EXPECT_EQ(kOldList, FileBytes(kList));
-    EXPECT_TRUE(DeployLog().empty());
+    EXPECT_EQ(kOldList, ReadBytes(kList));
+    EXPECT_TRUE(TaggedLogMessages("nginx_deploy").empty());
   }
 
   // A refused list leaves the one set before in place.
@@ -141,7 +142,7 @@ TEST(NginxConfOperatorSetVantoroProxy, RefusesAtTheFirstInvalidArgument) {
   EXPECT_FALSE(op.set_args({"192.0.2.10", "bad"}));
   EXPECT_EQ(0, op.run());
   EXPECT_EQ(std::string("bad is an invalid IP\n") + kSetLine, op.GetMsg());
-  EXPECT_EQ("set_real_ip_from 192.0.2.9;\n", FileBytes(kList));
+  EXPECT_EQ("set_real_ip_from 192.0.2.9;\n", ReadBytes(kList));
 
   // An empty list replaces the stored one too.
   EXPECT_TRUE(op.set_args({}));
@@ -150,11 +151,11 @@ TEST(NginxConfOperatorSetVantoroProxy, RefusesAtTheFirstInvalidArgument) {
 }
 
 TEST(NginxConfOperatorSetVantoroProxy, AnEmptyListDeletesTheFile) {
-  WriteFileAt("/tmp/target.conf", kOldList);
+  WriteBytes("/tmp/target.conf", kOldList);
   for (const char* state : {"file", "missing", "link"}) {
     SCOPED_TRACE(state);
     RemoveTree(kList);
-    if (std::string(state) == "file") WriteFileAt(kList, kOldList);
+    if (std::string(state) == "file") WriteBytes(kList, kOldList);
     if (std::string(state) == "link") {
       ASSERT_EQ(0, ::symlink("/tmp/target.conf", kList));
     }
@@ -163,16 +164,16 @@ TEST(NginxConfOperatorSetVantoroProxy, AnEmptyListDeletesTheFile) {
     EXPECT_EQ(kEmptyLines, set.msg);
     EXPECT_FALSE(PathExists(kList));
   }
-  EXPECT_EQ(kOldList, FileBytes("/tmp/target.conf"));
+  EXPECT_EQ(kOldList, ReadBytes("/tmp/target.conf"));
 
-  WriteFileAt(std::string(kList) + "/keep", "");  // a directory cannot be unlinked
+  WriteBytes(std::string(kList) + "/keep", "");  // a directory cannot be unlinked
   ClearLog();
   const Outcome failed = RunPlain(NGINXCONF_SET_VANTORO_PROXY);
   EXPECT_EQ(-1, failed.result);
   EXPECT_EQ("", failed.msg);
   EXPECT_EQ(Lines{"nginx_deploy:1071 Cannot delete /var/tmp/nginx/trusted_proxy/vantoro.conf "
                   "Is a directory"},
-            DeployLog());
+            TaggedLogMessages("nginx_deploy"));
 }
 
 TEST(NginxConfOperatorSetVantoroProxy, ThousandsOfAddressesRoundTrip) {
@@ -183,7 +184,7 @@ TEST(NginxConfOperatorSetVantoroProxy, ThousandsOfAddressesRoundTrip) {
                                          std::to_string(i % 256) + ".1");
   }
   EXPECT_EQ(0, RunSet(addresses).result);
-  EXPECT_EQ(ListFile(addresses), FileBytes(kList));
+  EXPECT_EQ(ListFile(addresses), ReadBytes(kList));
   std::string listed;
   for (const std::string& address : addresses) listed += address + "\n";
   EXPECT_EQ(listed, RunPlain(NGINXCONF_LIST_VANTORO_PROXY).msg);
@@ -191,14 +192,14 @@ TEST(NginxConfOperatorSetVantoroProxy, ThousandsOfAddressesRoundTrip) {
 
 TEST(NginxConfOperatorSetVantoroProxy, UnusableDirectoryIsLogged) {
   RemoveTree(kDir);
-  WriteFileAt(kDir, "not a directory");
+  WriteBytes(kDir, "not a directory");
   ClearLog();
   const Outcome set = RunSet({"192.0.2.1"});
   EXPECT_EQ(-1, set.result);
   EXPECT_EQ("", set.msg);
   EXPECT_EQ(Lines{"nginx_deploy:1060 TAVOFSMkdirP failed (/var/tmp/nginx/trusted_proxy, "
                   "Not a directory)"},
-            DeployLog());
+            TaggedLogMessages("nginx_deploy"));
 }
 
 struct FaultCase {
@@ -229,7 +230,7 @@ TEST(NginxConfOperatorSetVantoroProxy, FailureAtEachFileCallIsLoggedAndLeavesNoT
   };
   for (const FaultCase& c : cases) {
     SCOPED_TRACE(testing::Message() << "op " << static_cast<int>(c.op) << ", call " << c.nth);
-    WriteFileAt(kList, kOldList);
+    WriteBytes(kList, kOldList);
     ClearLog();
     Outcome set;
     {
@@ -239,9 +240,9 @@ TEST(NginxConfOperatorSetVantoroProxy, FailureAtEachFileCallIsLoggedAndLeavesNoT
     }
     EXPECT_EQ(c.result, set.result);
     EXPECT_EQ(c.result == 0 ? kSetLine : "", set.msg);
-    EXPECT_EQ(c.result == 0 ? "set_real_ip_from 192.0.2.1;\n" : kOldList, FileBytes(kList));
-    EXPECT_EQ(Lines{"vantoro.conf"}, ListDir(kDir));
-    Lines log = DeployLog();
+    EXPECT_EQ(c.result == 0 ? "set_real_ip_from 192.0.2.1;\n" : kOldList, ReadBytes(kList));
+    EXPECT_EQ(Lines{"vantoro.conf"}, DirNames(kDir));
+    Lines log = TaggedLogMessages("nginx_deploy");
     for (std::string& line : log) line = Normalised(line, c.log);
     EXPECT_EQ(c.log.empty() ? Lines{} : Lines{c.log}, log);
   }
@@ -252,14 +253,14 @@ TEST(NginxConfOperatorSetVantoroProxy, FaultLoopKeepsTheListWholeAndRemovesTheTe
     int n = 1;
     for (;; ++n) {
       SCOPED_TRACE(testing::Message() << "mode " << mode << ", call " << n);
-      WriteFileAt(kList, kOldList);
+      WriteBytes(kList, kOldList);
       fault::Arm arm(n, mode, EIO);
       const int result = RunSet({"192.0.2.1", "fd00::1"}).result;
       if (!arm.fired()) {
         EXPECT_EQ(0, result);
         break;
       }
-      const std::string bytes = FileBytes(kList);
+      const std::string bytes = ReadBytes(kList);
       if (result == 0) {
         EXPECT_EQ("set_real_ip_from 192.0.2.1;\nset_real_ip_from fd00::1;\n", bytes);
       } else {
@@ -267,7 +268,7 @@ TEST(NginxConfOperatorSetVantoroProxy, FaultLoopKeepsTheListWholeAndRemovesTheTe
         EXPECT_EQ(kOldList, bytes);
       }
       if (mode == fault::kOnce) {
-        EXPECT_EQ(Lines{"vantoro.conf"}, ListDir(kDir));
+        EXPECT_EQ(Lines{"vantoro.conf"}, DirNames(kDir));
       }
       RemoveTree(kDir);  // a persistent fault may leave its temporary
     }
@@ -277,12 +278,12 @@ TEST(NginxConfOperatorSetVantoroProxy, FaultLoopKeepsTheListWholeAndRemovesTheTe
 }
 
 TEST(NginxConfOperatorClearVantoroProxy, DeletesTheFileOrTheLinkOnly) {
-  WriteFileAt("/tmp/target.conf", kOldList);
+  WriteBytes("/tmp/target.conf", kOldList);
   for (const char* state : {"file", "missing", "link", "dangling link"}) {
     SCOPED_TRACE(state);
     RemoveTree(kList);
     const std::string s = state;
-    if (s == "file") WriteFileAt(kList, kOldList);
+    if (s == "file") WriteBytes(kList, kOldList);
     if (s == "link") {
       ASSERT_EQ(0, ::symlink("/tmp/target.conf", kList));
     }
@@ -294,18 +295,18 @@ TEST(NginxConfOperatorClearVantoroProxy, DeletesTheFileOrTheLinkOnly) {
     EXPECT_EQ(0, clear.result);
     EXPECT_EQ("Trust list of Vantoro servers is cleared.\n", clear.msg);
     EXPECT_FALSE(PathExists(kList));
-    EXPECT_TRUE(DeployLog().empty());
+    EXPECT_TRUE(TaggedLogMessages("nginx_deploy").empty());
   }
-  EXPECT_EQ(kOldList, FileBytes("/tmp/target.conf"));
+  EXPECT_EQ(kOldList, ReadBytes("/tmp/target.conf"));
 
-  WriteFileAt(std::string(kList) + "/keep", "");
+  WriteBytes(std::string(kList) + "/keep", "");
   ClearLog();
   const Outcome failed = RunPlain(NGINXCONF_CLEAR_VANTORO_PROXY);
   EXPECT_EQ(-1, failed.result);
   EXPECT_EQ("", failed.msg);
   EXPECT_EQ(Lines{"nginx_deploy:1146 Cannot delete link "
                   "/var/tmp/nginx/trusted_proxy/vantoro.conf Is a directory"},
-            DeployLog());
+            TaggedLogMessages("nginx_deploy"));
 }
 
 TEST(NginxConfOperatorListVantoroProxy, TakesTheWordAfterEachDirective) {
@@ -324,7 +325,7 @@ TEST(NginxConfOperatorListVantoroProxy, TakesTheWordAfterEachDirective) {
   for (const auto& [content, listed] : cases) {
     SCOPED_TRACE(content == nullptr ? "<missing>" : content);
     RemoveTree(kList);
-    if (content != nullptr) WriteFileAt(kList, content);
+    if (content != nullptr) WriteBytes(kList, content);
     const Outcome list = RunPlain(NGINXCONF_LIST_VANTORO_PROXY);
     EXPECT_EQ(0, list.result);
     EXPECT_EQ(listed, list.msg);
@@ -332,7 +333,7 @@ TEST(NginxConfOperatorListVantoroProxy, TakesTheWordAfterEachDirective) {
 }
 
 TEST(NginxConfOperatorListVantoroProxy, UnreadableFileIsLogged) {
-  WriteFileAt(kList, kOldList);
+  WriteBytes(kList, kOldList);
   ClearLog();
   {
     fault::Arm arm(1, fault::kOnce, EACCES, fault::Op::kOpen);
@@ -342,17 +343,17 @@ TEST(NginxConfOperatorListVantoroProxy, UnreadableFileIsLogged) {
   }
   EXPECT_EQ(Lines{"nginx_deploy:1163 Failed to open /var/tmp/nginx/trusted_proxy/vantoro.conf "
                   "Permission denied"},
-            DeployLog());
+            TaggedLogMessages("nginx_deploy"));
 
   RemoveTree(kList);
-  WriteFileAt(std::string(kList) + "/keep", "");  // opens, but reads fail
+  WriteBytes(std::string(kList) + "/keep", "");  // opens, but reads fail
   ClearLog();
   const Outcome list = RunPlain(NGINXCONF_LIST_VANTORO_PROXY);
   EXPECT_EQ(-1, list.result);
   EXPECT_EQ("", list.msg);
   const std::string expected =
       "nginx_deploy:N Failed to read /var/tmp/nginx/trusted_proxy/vantoro.conf Is a directory";
-  Lines log = DeployLog();
+  Lines log = TaggedLogMessages("nginx_deploy");
   for (std::string& line : log) line = Normalised(line, expected);
   EXPECT_EQ(Lines{expected}, log);
 }
