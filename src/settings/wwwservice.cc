@@ -62,8 +62,10 @@ bool WWWService::SetJson(Json::Value& value) {
   return true;
 }
 
-void WWWService::TransJsonToVar(Json::Value& value) {
-  if (value.empty()) return;
+void WWWService::TransJsonToVar(Json::Value& json) {
+  // A document that is not an object holds no key: the defaults stay.
+  if (json.empty() || !json.isObject()) return;
+  const Json::Value& value = json;
   const Json::Value& ports = value["additionalPort"];
   const bool has_ports = ports.isObject() && !ports.isNull();
   if (has_ports && ports["http"].isInt()) {

@@ -55,6 +55,8 @@ TEST(WWWService, ReadingRules) {
       {"mistyped ports", "{\"additionalPort\": {\"http\": \"80\", \"https\": 1.5}, \"ssl\": {}}", true, 0,
        0, kDefaultCert, false, false},
       {"null objects", "{\"additionalPort\": null, \"ssl\": null}", true, 0, 0, kDefaultCert, false, false},
+      {"not an object", "[8081]", true, 0, 0, kDefaultCert, false, false},
+      {"a number", "8081", true, 0, 0, kDefaultCert, false, false},
   };
   Engine engine;
   for (const Case& c : cases) {
