@@ -1,74 +1,32 @@
 // tavo-platform, the command-line face of the platform API, as the demo and
 // an administrator use it: argv in, output and exit status out, inside a
 // sandboxed appliance.
-#include <fcntl.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <fstream>
 #include <string>
 #include <vector>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "support/test_files.h"
+#include "support/test_process.h"
+
 namespace {
 
 using ::testing::HasSubstr;
 using ::testing::Not;
+using Result = tavow3::test::RunResult;
+using tavow3::test::RunCommand;
+using tavow3::test::WriteBytes;
 
 constexpr char kProgram[] = "/usr/tavo/bin/tavo-platform";
 
-struct Result {
-  int status = -1;  // exit status, -1 when killed
-  std::string out;
-  std::string err;
-};
-
-std::string Drain(int fd) {
-  std::string bytes;
-  char buffer[4096];
-  ssize_t n;
-  while ((n = read(fd, buffer, sizeof buffer)) > 0) bytes.append(buffer, n);
-  close(fd);
-  return bytes;
-}
-
-// Runs `program` with `args`; standard error goes to a file so that neither
-// pipe can fill while the other is read.
-Result RunProgram(const std::string& program, const std::vector<std::string>& args) {
-  int out[2];
-  EXPECT_EQ(0, pipe2(out, O_CLOEXEC));
-  char err_path[] = "/tmp/tavo-platform-err.XXXXXX";
-  int err = mkostemp(err_path, O_CLOEXEC);
-  EXPECT_GE(err, 0);
-  std::vector<char*> argv{const_cast<char*>(program.c_str())};
-  for (const std::string& arg : args) argv.push_back(const_cast<char*>(arg.c_str()));
-  argv.push_back(nullptr);
-  pid_t pid = fork();
-  if (pid == 0) {
-    dup2(out[1], 1);
-    dup2(err, 2);
-    execv(argv[0], argv.data());
-    _exit(127);
-  }
-  close(out[1]);
-  Result result;
-  result.out = Drain(out[0]);
-  int status = 0;
-  EXPECT_EQ(pid, waitpid(pid, &status, 0));
-  result.status = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-  std::ifstream in(err_path);
-  result.err.assign(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
-  close(err);
-  unlink(err_path);
-  return result;
-}
-
-Result Tool(const std::vector<std::string>& args) { return RunProgram(kProgram, args); }
-
-void WriteFile(const std::string& path, const std::string& bytes) {
-  std::ofstream(path, std::ios::binary | std::ios::trunc) << bytes;
+Result Tool(const std::vector<std::string>& args) {
+  std::vector<std::string> argv = {kProgram};
+  argv.insert(argv.end(), args.begin(), args.end());
+  return RunCommand(argv);
 }
 
 TEST(TavoPlatform, BadArgumentsExitTwoWithoutCallingThePlatform) {
@@ -142,7 +100,7 @@ TEST(TavoPlatform, FirewallModuleSetLoadsAndUnloadsInIptables) {
   EXPECT_EQ(set + ": not loaded\n", before.out);
 
   EXPECT_EQ(0, Tool({"fw-load", set}).status);
-  std::string rules = RunProgram("/usr/bin/iptables", {"-S"}).out;
+  std::string rules = RunCommand({"/usr/bin/iptables", "-S"}).out;
   EXPECT_THAT(rules, HasSubstr("-N ZAM_DEFAULT_FORWARD\n"));
   EXPECT_THAT(rules, HasSubstr("-A INPUT -j ZAM_DEFAULT_FORWARD\n"));
   Result loaded = Tool({"fw-status", set});
@@ -150,7 +108,7 @@ TEST(TavoPlatform, FirewallModuleSetLoadsAndUnloadsInIptables) {
   EXPECT_EQ(set + ": loaded\n", loaded.out);
 
   EXPECT_EQ(0, Tool({"fw-unload", set}).status);
-  EXPECT_THAT(RunProgram("/usr/bin/iptables", {"-S"}).out, Not(HasSubstr("ZAM_DEFAULT_FORWARD")));
+  EXPECT_THAT(RunCommand({"/usr/bin/iptables", "-S"}).out, Not(HasSubstr("ZAM_DEFAULT_FORWARD")));
   EXPECT_EQ(1, Tool({"fw-status", set}).status);
 
   Result unknown = Tool({"fw-load", "NO_SUCH_SET"});
@@ -179,7 +137,7 @@ TEST(TavoPlatform, TlsLevelsGoThroughTheStore) {
 }
 
 TEST(TavoPlatform, ServiceFilesAndPortLists) {
-  WriteFile("/tmp/demo.sc",
+  WriteBytes("/tmp/demo.sc",
             "[ZAM_5000]\ntitle=\"HTTP\"\ndesc=\"Z \\\"A\\\" \\\\M\"\nports=\"5000,8000:8010\"\n"
             "protocol=\"tcp\"\n\n[extra]\nports=\"53\"\nprotocol=\"udp\"\n");
   Result read = Tool({"sc-read", "/tmp/demo.sc"});
@@ -216,7 +174,7 @@ TEST(TavoPlatform, ServiceFilesAndPortLists) {
 }
 
 TEST(TavoPlatform, ServiceStatusFollowsThePidFile) {
-  WriteFile("/run/demo.pid", std::to_string(getpid()) + "\n");
+  WriteBytes("/run/demo.pid", std::to_string(getpid()) + "\n");
   Result running = Tool({"service-status", "demo"});
   EXPECT_EQ(0, running.status);
   EXPECT_EQ("demo: running (pid " + std::to_string(getpid()) + ")\n", running.out);
@@ -224,7 +182,7 @@ TEST(TavoPlatform, ServiceStatusFollowsThePidFile) {
   pid_t gone = fork();
   if (gone == 0) _exit(0);
   ASSERT_EQ(gone, waitpid(gone, nullptr, 0));
-  WriteFile("/run/demo.pid", std::to_string(gone) + "\n");
+  WriteBytes("/run/demo.pid", std::to_string(gone) + "\n");
   Result stopped = Tool({"service-status", "demo"});
   EXPECT_EQ(1, stopped.status);
   EXPECT_EQ("demo: stopped\n", stopped.out);
