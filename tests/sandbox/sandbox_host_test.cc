@@ -27,26 +27,21 @@
 #include <gtest/gtest.h>
 
 #include "support/syslog_capture.h"
+#include "support/test_files.h"
+#include "support/test_process.h"
 
 namespace {
 
+using tavow3::test::PathExists;
+using tavow3::test::ReadBytes;
+using tavow3::test::WaitUntil;
+
 constexpr char kSandbox[] = TAVOW3_SANDBOX_SCRIPT;
 constexpr char kTree[] = TAVOW3_SANDBOX_TREE;
-constexpr auto kPatience = std::chrono::seconds(10);
 
 std::string g_self;  // this program's absolute path, set by main()
 
 std::string Self() { return g_self; }
-
-bool Exists(const std::string& path) {
-  struct stat st {};
-  return ::lstat(path.c_str(), &st) == 0;
-}
-
-std::string ReadFile(const std::string& path) {
-  std::ifstream in(path);
-  return std::string((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
-}
 
 // A name no other run shares: the cases run in parallel.
 std::string Token() {
@@ -158,29 +153,19 @@ bool ChainExists(const std::string& chain) {
 }
 
 // Processes are observed through the host's /proc, which a chroot may lack.
-bool HostHasProc() { return Exists("/proc/self/cmdline"); }
+bool HostHasProc() { return PathExists("/proc/self/cmdline"); }
 
 bool ProcessWithArgExists(const std::string& token) {
   DIR* proc = ::opendir("/proc");
   bool found = false;
   while (dirent* entry = proc ? ::readdir(proc) : nullptr) {
-    std::string cmdline = ReadFile(std::string("/proc/") + entry->d_name + "/cmdline");
+    std::string cmdline = ReadBytes(std::string("/proc/") + entry->d_name + "/cmdline");
     if (cmdline.find(token) != std::string::npos && std::atoi(entry->d_name) != ::getpid()) {
       found = true;
     }
   }
   if (proc) ::closedir(proc);
   return found;
-}
-
-template <typename Predicate>
-bool WaitFor(Predicate done) {
-  auto deadline = std::chrono::steady_clock::now() + kPatience;
-  while (!done()) {
-    if (std::chrono::steady_clock::now() > deadline) return false;
-    std::this_thread::sleep_for(std::chrono::milliseconds(10));
-  }
-  return true;
 }
 
 // ---- helpers, run inside the sandbox ----
@@ -217,7 +202,7 @@ int MakeOrphan() {
   if (::read(pipe_fds[0], &grandchild, sizeof grandchild) != sizeof grandchild) return 2;
   ::waitpid(child, nullptr, 0);
   std::string proc = "/proc/" + std::to_string(grandchild);
-  return WaitFor([&] { return !Exists(proc); }) ? 0 : 1;
+  return WaitUntil([&] { return !PathExists(proc); }) ? 0 : 1;
 }
 
 int Helper(const std::string& name, const std::string& arg) {
@@ -250,16 +235,16 @@ TEST(Sandbox, LeavesTheHostUnchanged) {
     watched.push_back(std::string(dir) + "/" + token);
   }
   std::map<std::string, bool> before;
-  for (const std::string& path : watched) before[path] = Exists(path);
+  for (const std::string& path : watched) before[path] = PathExists(path);
   const std::string chain = token.substr(0, 28);
   ASSERT_FALSE(ChainExists(chain));
 
   Result result = RunHelper("write-everywhere", token);
   ASSERT_EQ(0, result.status) << "2-4: the shm, iptables or syslog step failed";
 
-  for (const std::string& path : watched) EXPECT_EQ(before[path], Exists(path)) << path;
+  for (const std::string& path : watched) EXPECT_EQ(before[path], PathExists(path)) << path;
   for (const char* dir : {"/etc", "/var", "/run", "/tmp", "/dev", "/usr/bin"}) {
-    EXPECT_FALSE(Exists(std::string(dir) + "/" + token)) << dir;
+    EXPECT_FALSE(PathExists(std::string(dir) + "/" + token)) << dir;
   }
   EXPECT_FALSE(ChainExists(chain));
 }
@@ -301,7 +286,7 @@ TEST(Sandbox, KillsWhatTheCommandLeftRunning) {
   if (!HostHasProc()) GTEST_SKIP() << "no /proc on this host to watch processes in";
   const std::string token = Token();
   EXPECT_EQ(0, RunHelper("leave-a-daemon", token).status);
-  EXPECT_TRUE(WaitFor([&] { return !ProcessWithArgExists(token); }));
+  EXPECT_TRUE(WaitUntil([&] { return !ProcessWithArgExists(token); }));
 }
 
 TEST(Sandbox, TearsDownWhenKilled) {
@@ -312,7 +297,7 @@ TEST(Sandbox, TearsDownWhenKilled) {
   ASSERT_TRUE(ProcessWithArgExists(token));
   ASSERT_EQ(0, ::kill(child.pid(), SIGTERM));
   EXPECT_EQ(128 + SIGTERM, child.WaitStatus());
-  EXPECT_TRUE(WaitFor([&] { return !ProcessWithArgExists(token); }));
+  EXPECT_TRUE(WaitUntil([&] { return !ProcessWithArgExists(token); }));
 }
 
 TEST(Sandbox, KeepsTheScratchWithTheLogOnRequest) {
@@ -320,15 +305,15 @@ TEST(Sandbox, KeepsTheScratchWithTheLogOnRequest) {
   const std::string err = token + ".stderr";
   Result result = RunHelper("write-everywhere", token, {"--keep"}, err);
   ASSERT_EQ(0, result.status);
-  std::string said = ReadFile(err);
+  std::string said = ReadBytes(err);
   ::unlink(err.c_str());
   const std::string kept = "sandbox: kept ";
   ASSERT_EQ(0u, said.rfind(kept, 0)) << said;
   std::string scratch = said.substr(kept.size(), said.find('\n') - kept.size());
   ASSERT_EQ(0u, scratch.rfind("/tmp/tavow3-sandbox.", 0)) << scratch;
-  EXPECT_EQ("x", ReadFile(scratch + "/etc/upper/" + token));
-  EXPECT_EQ("x", ReadFile(scratch + "/tmp/" + token));
-  std::string log = ReadFile(scratch + "/run/tavow3-sandbox/syslog");
+  EXPECT_EQ("x", ReadBytes(scratch + "/etc/upper/" + token));
+  EXPECT_EQ("x", ReadBytes(scratch + "/tmp/" + token));
+  std::string log = ReadBytes(scratch + "/run/tavow3-sandbox/syslog");
   EXPECT_NE(std::string::npos, log.find("<12>")) << log;  // LOG_USER | LOG_WARNING
   EXPECT_NE(std::string::npos, log.find(": " + token + "\n")) << log;
   std::string remove = "rm -rf --one-file-system " + scratch;
@@ -345,7 +330,7 @@ TEST(Sandbox, RefusesToStageOutsideItsPrivateTrees) {
   std::string remove = "rm -rf " + tree;
   EXPECT_EQ(0, std::system(remove.c_str()));
   EXPECT_EQ(125, result.status);
-  EXPECT_FALSE(Exists("/opt/" + token));
+  EXPECT_FALSE(PathExists("/opt/" + token));
 }
 
 }  // namespace
