@@ -149,7 +149,8 @@ TEST(DeployNginxHup, FailsWithoutTheGenerationLock) {
     EXPECT_TRUE(arm.fired());
     EXPECT_EQ("", manager.GetMsg());
   }
-  EXPECT_EQ(Lines{"nginx_deploy:918 Failed to get genente nginx config lock."}, TaggedLogMessages("nginx_deploy"));
+  EXPECT_EQ(Lines{"nginx_deploy:918 Failed to get genente nginx config lock."},
+            TaggedLogMessages("nginx_deploy"));
   EXPECT_TRUE(before == Take());
 }
 

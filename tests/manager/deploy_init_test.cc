@@ -1,8 +1,6 @@
 // The start-up decision (operator 0) with the real generator, nginx and iptables.
 #include <tavow3/nginx_conf_manager.h>
 
-#include <fcntl.h>
-#include <sys/file.h>
 #include <unistd.h>
 
 #include <functional>
@@ -25,13 +23,6 @@ using Calls = std::vector<std::vector<std::string>>;
 constexpr char kNormalLine[] = "Start Nginx Server in Normal Mode ......\n";
 constexpr char kDefaultLine[] = "Start Nginx Server in Default Mode ......\n";
 const Calls kAlert = {{"@administrators", "zamnotify:system_event", "widget:apache_statup_failed"}};
-
-bool GenerationLockIsFree() {
-  const int fd = ::open("/run/lock/nginx_gen.lock", O_RDONLY | O_CLOEXEC);
-  const bool free = fd >= 0 && ::flock(fd, LOCK_EX | LOCK_NB) == 0;
-  if (fd >= 0) ::close(fd);
-  return free;
-}
 
 void BreakFragment() {
   WriteBytes("/usr/local/etc/nginx/conf.d/broken.conf", "bogus_directive on;\n");

@@ -1,8 +1,6 @@
 // The generation operators (2, 3, 4): their messages, results and lock.
 #include <tavow3/nginx_conf_manager.h>
 
-#include <fcntl.h>
-#include <sys/file.h>
 #include <unistd.h>
 
 #include <functional>
@@ -34,13 +32,6 @@ void CountGeneratorRuns() {
   WriteBytes(kGeneratorScript,
               "#!/bin/sh\necho run >> /tmp/generator.runs\nexec /usr/tavo/bin/tavonginxgen\n",
               0755);
-}
-
-bool GenerationLockIsFree() {
-  const int fd = ::open("/run/lock/nginx_gen.lock", O_RDONLY | O_CLOEXEC);
-  const bool free = fd >= 0 && ::flock(fd, LOCK_EX | LOCK_NB) == 0;
-  if (fd >= 0) ::close(fd);
-  return free;
 }
 
 struct GenCase {

@@ -1,6 +1,7 @@
 #include "manager_fixtures.h"
 
 #include <fcntl.h>
+#include <sys/file.h>
 #include <sys/mman.h>
 #include <unistd.h>
 
@@ -20,6 +21,8 @@ namespace {
 constexpr size_t kRecordSize = 4096;
 
 }  // namespace
+
+bool GenerationLockIsFree() { return CanFlock("/run/lock/nginx_gen.lock", LOCK_EX); }
 
 bool HasDefaultRule() {
   const std::vector<std::string> rules = IptablesRules();

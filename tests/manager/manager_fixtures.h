@@ -16,6 +16,10 @@ inline constexpr char kMainConf[] = "/etc/nginx/nginx.conf";
 inline constexpr char kDefaultRule[] =
     "-A ZAM_DEFAULT_FORWARD -p tcp -m multiport --dports 5000,5001 -j ACCEPT";
 
+// Whether a new open file description gets the generation lock
+// "/run/lock/nginx_gen.lock" now; false when the file is missing.
+bool GenerationLockIsFree();
+
 // Whether "iptables -S" lists kDefaultRule.
 bool HasDefaultRule();
 

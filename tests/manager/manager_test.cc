@@ -176,7 +176,8 @@ TEST(NginxConfManager, ForceDefaultFailuresAreLogged) {
   NginxConfManager no_dir(NGINXCONF_FORCE_DEFAULT);
   EXPECT_EQ(-1, no_dir.run());
   EXPECT_EQ("", no_dir.GetMsg());
-  EXPECT_EQ(Lines{"nginx_deploy:1041 Faild to mkdir /run/tavow3"}, TaggedLogMessages("nginx_deploy"));
+  EXPECT_EQ(Lines{"nginx_deploy:1041 Faild to mkdir /run/tavow3"},
+            TaggedLogMessages("nginx_deploy"));
 
   // A dangling link where the flag goes: it can be neither created nor seen.
   RemoveTree("/run/tavow3");
@@ -185,7 +186,8 @@ TEST(NginxConfManager, ForceDefaultFailuresAreLogged) {
   ClearLog();
   NginxConfManager no_flag(NGINXCONF_FORCE_DEFAULT);
   EXPECT_EQ(-1, no_flag.run());
-  EXPECT_EQ(Lines{"nginx_deploy:1045 Failed to create force default flag"}, TaggedLogMessages("nginx_deploy"));
+  EXPECT_EQ(Lines{"nginx_deploy:1045 Failed to create force default flag"},
+            TaggedLogMessages("nginx_deploy"));
   EXPECT_FALSE(NginxConfOperatorForceDefault::IsForced());
 }
 

@@ -1,6 +1,5 @@
 // The appliance's generator and the web server's control script with the
 // real nginx, curl and iptables.
-#include <sys/stat.h>
 
 #include <string>
 #include <vector>
@@ -27,11 +26,6 @@ bool Serves(const std::string& url, const std::string& page) {
 }
 
 RunResult Service(const std::string& verb) { return RunCommand({kNginxScript, verb}); }
-
-mode_t ModeOf(const std::string& path) {
-  struct stat st;
-  return ::stat(path.c_str(), &st) == 0 ? st.st_mode & 07777 : 0;
-}
 
 TEST(NginxGenerator, WritesEveryFileAtomicallyAndNginxAcceptsThem) {
   const RunResult first = RunCommand({kGeneratorScript});

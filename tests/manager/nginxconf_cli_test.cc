@@ -71,7 +71,8 @@ TEST(Tavow3Nginxconf, HelpNamesEveryOperatorAndUnknownOnesAreLogged) {
   }
   ClearLog();
   EXPECT_EQ(255, RunCommand({kCli, "11"}).status);
-  EXPECT_EQ(std::vector<std::string>{"nginx_deploy:800 bad parrameter"}, TaggedLogMessages("nginx_deploy"));
+  EXPECT_EQ(std::vector<std::string>{"nginx_deploy:800 bad parrameter"},
+            TaggedLogMessages("nginx_deploy"));
 }
 
 }  // namespace

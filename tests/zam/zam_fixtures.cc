@@ -38,8 +38,8 @@ Registry Snapshot(Engine& engine) {
 void StandInGenerator(const std::string& conf) {
   WriteBytes("/run/standin-nginx.conf", conf);
   WriteBytes(kGenerator,
-             "#!/bin/sh\nmkdir -p /var/tmp/nginx\ncp /run/standin-nginx.conf /var/tmp/nginx/nginx.conf\n"
-             "touch /var/tmp/nginx/ZAM.tmp\n",
+             "#!/bin/sh\nmkdir -p /var/tmp/nginx\n"
+             "cp /run/standin-nginx.conf /var/tmp/nginx/nginx.conf\ntouch /var/tmp/nginx/ZAM.tmp\n",
              0755);
 }
 
