@@ -70,17 +70,18 @@ bool FillTemp(const std::string& temp, const std::string& text) {
 // Writes the list to a new temporary file and renames it over the live one.
 // The temporary is always removed afterwards.
 int ReplaceList(const std::vector<std::string>& addresses, std::string* msg) {
-  std::string temp;
+  // When mkstemp fails, the removal at the end still runs, on the pattern's
+  // own name: on a file system that refuses the creation it says why once more.
+  std::string temp = kTempTemplate;
+  bool made;
   {
     // The file is filled through a descriptor of its own, opened by name.
-    const base::UniqueFd made = base::MakeTemp(kTempTemplate, &temp);
-    if (!made) {
-      TAVOW3_LOG_ERR_AT(1088, "Fail to create temp file (%s, %m)", kTempTemplate);
-      return -1;
-    }
+    const base::UniqueFd fd = base::MakeTemp(kTempTemplate, &temp);
+    made = fd.valid();
+    if (!made) TAVOW3_LOG_ERR_AT(1088, "Fail to create temp file (%s, %m)", kTempTemplate);
   }
   int result = -1;
-  if (FillTemp(temp, ListText(addresses))) {
+  if (made && FillTemp(temp, ListText(addresses))) {
     if (base::Rename(temp, kListFile)) {
       *msg += "List of Vantoro servers is set.\n";
       result = 0;
