@@ -249,25 +249,29 @@ TEST(GenerateFirewallConfig, InstallFailureKeepsBackupOfPreviousFile) {
   EXPECT_EQ(kOld, ReadBytes(kSystemBackup));
 }
 
-TEST(GenerateFirewallConfig, PackageDirectoryFailures) {
-  Engine engine = LoadedEngine();
-  Register(engine, 8080, S::HTTP, "Pagora");
-  std::filesystem::remove_all("/usr/local/etc/services.d");
-  ASSERT_TRUE(BindReadOnly("/usr/local/etc"));
-  ClearLog();
-  EXPECT_FALSE(engine.GenerateFirewallConfig("Pagora"));
-  EXPECT_EQ(std::vector<std::string>{"engine:381 make directory /usr/local/etc/services.d failed"},
-            LogMessages(LOG_ERR));
-  EXPECT_FALSE(PathExists(kPackageFile));
-
-  Engine system = LoadedEngine();
-  Register(system, 8080, S::HTTP, "tavow3");
-  std::filesystem::remove_all("/usr/tavo/etc/services.d");
-  ASSERT_TRUE(BindReadOnly("/usr/tavo/etc"));
-  ClearLog();
-  EXPECT_FALSE(system.GenerateFirewallConfig("tavow3"));
-  EXPECT_EQ(std::vector<std::string>{"engine:375 make directory /usr/tavo/etc/services.d failed"},
-            LogMessages(LOG_ERR));
+TEST(GenerateFirewallConfig, ServiceDirectoryThatCannotBeMadeFails) {
+  const struct {
+    const char* owner;
+    const char* dir;
+    const char* read_only;
+    const char* log_line;
+  } cases[] = {
+      {"Pagora", "/usr/local/etc/services.d", "/usr/local/etc",
+       "engine:381 make directory /usr/local/etc/services.d failed"},
+      {"tavow3", "/usr/tavo/etc/services.d", "/usr/tavo/etc",
+       "engine:375 make directory /usr/tavo/etc/services.d failed"},
+  };
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.owner);
+    Engine engine = LoadedEngine();
+    Register(engine, 8080, S::HTTP, c.owner);
+    RemoveTree(c.dir);
+    ASSERT_TRUE(BindReadOnly(c.read_only));
+    ClearLog();
+    EXPECT_FALSE(engine.GenerateFirewallConfig(c.owner));
+    EXPECT_EQ(std::vector<std::string>{c.log_line}, LogMessages(LOG_ERR));
+    EXPECT_FALSE(PathExists(std::string(c.dir) + "/" + c.owner + ".sc"));
+  }
 }
 
 TEST(GenerateFirewallConfig, BackupFailureIsOnlyLogged) {
