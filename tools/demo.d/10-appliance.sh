@@ -2,19 +2,7 @@
 # The appliance and its platform layer: programs, firewall module sets, TLS store.
 set -euo pipefail
 
-# Shows a command as one would type it, then runs it.
-show() {
-  local arg line=
-  for arg in "$@"; do
-    if [[ $arg =~ ^[A-Za-z0-9_./:=,+-]+$ ]]; then
-      line+=" $arg"
-    else
-      line+=" '${arg//\'/\'\\\'\'}'"
-    fi
-  done
-  printf '\n$%s\n' "$line"
-  "$@"
-}
+source "$(dirname "${BASH_SOURCE[0]}")/../lib/demo-show.sh"
 
 echo "The sandbox is a throwaway appliance: its own mounts, network and processes."
 show find /usr/tavo -maxdepth 3

@@ -2,19 +2,7 @@
 # The engine: its registry and the ports other processes hold, which it refuses.
 set -euo pipefail
 
-# Shows a command as one would type it, then runs it.
-show() {
-  local arg line=
-  for arg in "$@"; do
-    if [[ $arg =~ ^[A-Za-z0-9_./:=,+@-]+$ ]]; then
-      line+=" $arg"
-    else
-      line+=" '${arg//\'/\'\\\'\'}'"
-    fi
-  done
-  printf '\n$%s\n' "$line"
-  "$@"
-}
+source "$(dirname "${BASH_SOURCE[0]}")/../lib/demo-show.sh"
 
 # Waits (up to 10 s) until something listens on TCP port $1.
 wait_listening() {

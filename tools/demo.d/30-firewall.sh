@@ -2,11 +2,7 @@
 # Firewall service files: the engine's registry rendered by tavomustache.
 set -euo pipefail
 
-# Shows a command, then runs it.
-show() {
-  printf '\n$ %s\n' "$*"
-  "$@"
-}
+source "$(dirname "${BASH_SOURCE[0]}")/../lib/demo-show.sh"
 
 installed=/usr/tavo/etc/services.d/tavow3.sc
 echo "Regenerate tavow3.sc from the stored settings (TAVOW3_Fw_RegenAll, a C client):"

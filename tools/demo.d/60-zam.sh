@@ -2,12 +2,7 @@
 # The management interface: a management tool moves its HTTPS port.
 set -euo pipefail
 
-# Shows a command as one would type it, then runs it; a failure shows its
-# exit status and the step goes on.
-show() {
-  printf '\n$ %s\n' "$*"
-  "$@" || echo "(exit status $?)"
-}
+source "$(dirname "${BASH_SOURCE[0]}")/../lib/demo-show.sh"
 
 # Shows the command, then polls it (up to 5 s) until it succeeds: nginx
 # replaces its workers shortly after the reload signal.
@@ -43,28 +38,28 @@ nginx_sh=/usr/tavo/etc/rc.sysv/nginx.sh
 # refuses (and so the Default mode) behind: this step starts from a clean boot.
 rm -f /usr/local/etc/nginx/conf.d/broken.conf /usr/tavo/etc/www/WWWService.json
 "$nginx_sh" stop
-show "$nginx_sh" start
-show tavow3-nginxconf 5
-show tavow3-zam show
-show curl -sk https://127.0.0.1:5001/
+show_any "$nginx_sh" start
+show_any tavow3-nginxconf 5
+show_any tavow3-zam show
+show_any curl -sk https://127.0.0.1:5001/
 
 echo
 echo "The tool asks for HTTPS port 6001 (SetHttpsPort with a PortValidator) and"
 echo "applies it (Set): the engine registers the port, the configuration is"
 echo "generated from the staged /var/tmp/nginx/ZAM.json and tested by nginx, the"
 echo "file installed, nginx reloaded and the firewall told."
-show tavow3-zam set-https-port 6001
+show_any tavow3-zam set-https-port 6001
 show_soon curl -sfk https://127.0.0.1:6001/
 show_refused_soon https://127.0.0.1:5001/
-show cat /usr/tavo/etc/www/ZAM.json
+show_any cat /usr/tavo/etc/www/ZAM.json
 echo
 echo "The firewall service file declares the new port:"
-show grep -A6 '^\[zma_https\]' /usr/tavo/etc/services.d/tavow3.sc
+show_any grep -A6 '^\[zma_https\]' /usr/tavo/etc/services.d/tavow3.sc
 
 echo
 echo "Ports the engine refuses change nothing: 443 belongs to HTTPS of any host,"
 echo "and 5000 is the interface's own HTTP port."
-show tavow3-zam set-https-port 443
-show tavow3-zam set-https-port 5000
-show tavow3-zam show
-show "$nginx_sh" stop
+show_any tavow3-zam set-https-port 443
+show_any tavow3-zam set-https-port 5000
+show_any tavow3-zam show
+show_any "$nginx_sh" stop
