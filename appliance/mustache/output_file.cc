@@ -6,7 +6,6 @@
 
 #include <cerrno>
 #include <cstring>
-#include <vector>
 
 namespace tavomustache {
 namespace {
@@ -68,17 +67,22 @@ bool ReadWholeFile(const std::string& path, std::string* content, std::string* e
   return true;
 }
 
-bool WriteFileAtomically(const std::string& path, const std::string& content, std::string* error) {
-  std::vector<char> temp(path.begin(), path.end());
-  const std::string suffix = ".XXXXXX";
-  temp.insert(temp.end(), suffix.begin(), suffix.end());
-  temp.push_back('\0');
-  const int fd = ::mkostemp(temp.data(), O_CLOEXEC);
+int MakeHiddenTemp(const std::string& path, std::string* temp, std::string* error) {
+  const size_t slash = path.rfind('/');
+  std::string name = path.substr(0, slash + 1) + "." + path.substr(slash + 1) + ".XXXXXX";
+  const int fd = ::mkostemp(name.data(), O_CLOEXEC);
   if (fd < 0) {
     *error = Describe("cannot create a temporary file for", path);
-    return false;
+    return -1;
   }
-  const std::string temp_path(temp.data());
+  *temp = name;
+  return fd;
+}
+
+bool WriteFileAtomically(const std::string& path, const std::string& content, std::string* error) {
+  std::string temp_path;
+  const int fd = MakeHiddenTemp(path, &temp_path, error);
+  if (fd < 0) return false;
   bool ok = WriteAll(fd, content) && ::fchmod(fd, 0644) == 0 && ::fsync(fd) == 0;
   if (!ok) *error = Describe("cannot write", temp_path);
   if (::close(fd) != 0 && ok) {

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "files.h"
+#include "output_file.h"
 
 namespace tavonginxgen {
 namespace {
@@ -15,7 +16,7 @@ constexpr char kOpenssl[] = "/usr/bin/openssl";
 
 // Reserves a hidden temporary name beside `path` for openssl to write to.
 bool ReserveName(const std::string& path, std::string* temp, std::string* error) {
-  const int fd = MakeHiddenTemp(path, temp, error);
+  const int fd = tavomustache::MakeHiddenTemp(path, temp, error);
   if (fd < 0) return false;
   ::close(fd);
   return true;

@@ -15,17 +15,6 @@ std::string Describe(const std::string& what, const std::string& path) {
   return what + " " + path + ": " + std::strerror(errno);
 }
 
-bool WriteAll(int fd, const std::string& content) {
-  size_t done = 0;
-  while (done < content.size()) {
-    const ssize_t n = ::write(fd, content.data() + done, content.size() - done);
-    if (n < 0 && errno == EINTR) continue;
-    if (n <= 0) return false;
-    done += static_cast<size_t>(n);
-  }
-  return true;
-}
-
 void ReadAll(int fd, std::string* out) {
   char buffer[4096];
   for (;;) {
@@ -54,33 +43,6 @@ bool MakeDirectories(const std::string& path, std::string* error) {
     }
     if (slash == std::string::npos) return true;
   }
-}
-
-int MakeHiddenTemp(const std::string& path, std::string* temp, std::string* error) {
-  const size_t slash = path.rfind('/');
-  std::string name = path.substr(0, slash + 1) + "." + path.substr(slash + 1) + ".XXXXXX";
-  const int fd = ::mkostemp(name.data(), O_CLOEXEC);
-  if (fd < 0) {
-    *error = Describe("cannot create a temporary file for", path);
-    return -1;
-  }
-  *temp = name;
-  return fd;
-}
-
-bool ReplaceFile(const std::string& path, const std::string& content, std::string* error) {
-  std::string temp;
-  const int fd = MakeHiddenTemp(path, &temp, error);
-  if (fd < 0) return false;
-  bool ok = WriteAll(fd, content) && ::fchmod(fd, 0644) == 0 && ::fsync(fd) == 0;
-  if (::close(fd) != 0) ok = false;
-  if (!ok) *error = Describe("cannot write", temp);
-  if (ok && ::rename(temp.c_str(), path.c_str()) != 0) {
-    ok = false;
-    *error = Describe("cannot replace", path);
-  }
-  if (!ok) (void)::unlink(temp.c_str());
-  return ok;
 }
 
 int RunCollecting(const std::vector<std::string>& argv, std::string* output) {

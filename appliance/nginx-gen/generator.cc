@@ -53,7 +53,7 @@ bool Generate(const Settings& settings, const std::string& template_dir, std::st
     if (!MakeDirectories(dir, error)) return false;
   }
   for (size_t i = 0; i < texts.size(); ++i) {
-    if (!ReplaceFile(kOutputs[i].path, texts[i], error)) return false;
+    if (!tavomustache::WriteFileAtomically(kOutputs[i].path, texts[i], error)) return false;
   }
   return true;
 }
